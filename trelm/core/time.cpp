@@ -1,0 +1,19 @@
+// Scene frame rate shared by controllers and expressions.
+#include <trelm/core/time.h>
+
+#include <atomic>
+
+namespace TrelmSDK {
+
+namespace {
+// Written on the main thread when a scene is loaded; read by any thread evaluating time.
+std::atomic<int> g_frameRate{30};
+} // namespace
+
+int GetFrameRate() { return g_frameRate.load(std::memory_order_relaxed); }
+
+void SetFrameRate(int fps) {
+    if (fps > 0 && TICKS_PER_SECOND % fps == 0) g_frameRate.store(fps, std::memory_order_relaxed);
+}
+
+} // namespace TrelmSDK
