@@ -10,14 +10,19 @@
 namespace OSL {
 
 /// Base class of every OSO consumer. parse_file/parse_memory drive the callbacks below; all of
-/// them do nothing by default. Malformed or truncated text is reported to the error handler as
-/// "LINE: message" (with the file name in front when parsing a file) and makes the parse return
-/// false; callbacks already made stay made.
+/// them do nothing by default. The whole text is checked before the first callback: malformed or
+/// truncated text (the code must finish with its `end` instruction) is reported to the error
+/// handler as "SOURCE:LINE: error: message" (SOURCE is the file name, or "<buffer>") and makes the
+/// parse return false without any callback.
 ///
-/// Callback order: version, shader, then for every symbol line: symbol, its symdefaults, its hints,
-/// and parameter_done for params and oparams; then for every "code NAME" line: codemarker, and
-/// for every instruction: instruction, instruction_arg / instruction_jump in the order written,
-/// its hints, instruction_end; finally codeend once. The shader line's hints come after shader.
+/// Callback order: version, shader, the shader line's hints, then for every symbol line: symbol,
+/// its symdefaults, its hints, and parameter_done for params and oparams; then for every
+/// "code NAME" line: codemarker, and for every instruction: instruction, its instruction_args,
+/// its instruction_jumps, its hints, instruction_end; finally codeend once.
+///
+/// Struct-typed symbols carry the id of a struct registered (or found) in the TypeSpec registry
+/// under "SHADERNAME_STRUCTNAME", with the fields the symbol's %structfields and
+/// %structfieldtypes hints give.
 ///
 /// A reader holds no shared state: different readers may parse on different threads at once.
 class OSOReader {
@@ -56,16 +61,16 @@ public:
     /// All information about the last parameter (param or oparam) has been given.
     virtual void parameter_done() {}
 
-    /// Readers that only want the parameters return true: parsing then stops successfully at the
-    /// first symbol that is neither a param nor an oparam.
+    /// Readers that only want the parameters return true: the callbacks then stop (and the parse
+    /// succeeds) at the first temp symbol.
     virtual bool stop_parsing_at_temp_symbols() { return false; }
 
     /// One hint of the shader line, of the last symbol or of the last instruction, exactly as
     /// written (e.g. `%meta{float,min,0}`, `%line{12}`).
     virtual void hint(string_view hintstring) { (void)hintstring; }
 
-    /// Readers that need no code return false: parsing then stops successfully at the first
-    /// "code" line, without a codeend.
+    /// Readers that need no code return false: the callbacks then stop (and the parse succeeds)
+    /// at the first "code" line, without a codeend.
     virtual bool parse_code_section() { return true; }
 
     /// A "code NAME" line: the instructions that follow belong to section NAME.
