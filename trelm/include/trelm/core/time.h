@@ -15,7 +15,28 @@ inline constexpr TimeValue TIME_PosInfinity = 0x7fffffff;
 // Frames per second of the scene; 30 unless the scene says otherwise.
 int GetFrameRate();
 void SetFrameRate(int fps);
-inline int GetTicksPerFrame() { return TICKS_PER_SECOND / GetFrameRate(); }
+inline int GetTicksPerFrame() {
+    return TICKS_PER_SECOND / GetFrameRate();
+}
+
+// Conversions between ticks, seconds and (possibly fractional) frames at the current frame rate.
+inline double TicksToSec(TimeValue t) {
+    return static_cast<double>(t) / TICKS_PER_SECOND;
+}
+inline TimeValue SecToTicks(double s) {
+    return static_cast<TimeValue>(s * TICKS_PER_SECOND);
+}
+inline double TicksToFrames(TimeValue t) {
+    return static_cast<double>(t) / GetTicksPerFrame();
+}
+inline TimeValue FramesToTicks(double f) {
+    return static_cast<TimeValue>(f * GetTicksPerFrame());
+}
+
+// The scene's current animation time (the time slider). Written on the main thread; panels and
+// updates read it there too.
+TimeValue GetAnimTime();
+void SetAnimTime(TimeValue t);
 
 // A closed time interval [start, end]. "never" is the empty interval (both ends 0x80000000);
 // "forever" covers all time.
@@ -34,7 +55,9 @@ public:
     constexpr void SetInstant(TimeValue t) { Set(t, t); }
 
     constexpr bool Empty() const { return start_ == TIME_NegInfinity && end_ == TIME_NegInfinity; }
-    constexpr bool IsInfinite() const { return start_ == TIME_NegInfinity && end_ == TIME_PosInfinity; }
+    constexpr bool IsInfinite() const {
+        return start_ == TIME_NegInfinity && end_ == TIME_PosInfinity;
+    }
     constexpr bool InInterval(TimeValue t) const { return !Empty() && t >= start_ && t <= end_; }
 
     // Intersection: the part of time both intervals cover.
@@ -55,3 +78,8 @@ inline constexpr Interval FOREVER{TIME_NegInfinity, TIME_PosInfinity};
 inline constexpr Interval NEVER{TIME_NegInfinity, TIME_NegInfinity};
 
 } // namespace TrelmSDK
+
+using TrelmSDK::FOREVER;
+using TrelmSDK::Interval;
+using TrelmSDK::NEVER;
+using TrelmSDK::TimeValue;
