@@ -9,14 +9,14 @@
 namespace OSL {
 
 OSOReader::OSOReader(ErrorHandler* errhandler)
-    : m_err(errhandler ? *errhandler : ErrorHandler::default_handler()) {}
+    : m_err(errhandler ? errhandler : &ErrorHandler::default_handler()) {}
 
 OSOReader::~OSOReader() = default;
 
 bool OSOReader::parse_file(const std::string& filename) {
     std::string text;
     if (!OIIO::Filesystem::read_text_file(filename, text)) {
-        m_err.error("File \"" + filename + "\" could not be read");
+        m_err->error("File \"" + filename + "\" could not be read");
         return false;
     }
     m_lineno = 1;

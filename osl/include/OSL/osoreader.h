@@ -31,8 +31,10 @@ public:
     explicit OSOReader(ErrorHandler* errhandler = nullptr);
     virtual ~OSOReader();
 
-    OSOReader(const OSOReader&) = delete;
-    OSOReader& operator=(const OSOReader&) = delete;
+    // A subclass holding a filled model may be copied or moved; the copy reports to the same
+    // error handler.
+    OSOReader(const OSOReader&) = default;
+    OSOReader& operator=(const OSOReader&) = default;
 
     /// Reads and parses the named file. False when it cannot be read or does not parse.
     virtual bool parse_file(const std::string& filename);
@@ -95,11 +97,11 @@ public:
     int lineno() const { return m_lineno; }
 
     /// The handler errors are reported to.
-    ErrorHandler& errhandler() { return m_err; }
+    ErrorHandler& errhandler() { return *m_err; }
 
 private:
     friend class OSOParser;
-    ErrorHandler& m_err;
+    ErrorHandler* m_err;
     int m_lineno = 1;
 };
 

@@ -89,7 +89,13 @@ public:
     /// The registered description of this struct, null when this is not a struct.
     StructSpec* structspec() const { return structspec(m_structure); }
 
-    /// The struct registered under id, null for 0 or an id never handed out. Lock-free.
+    /// The struct registered under id, null for 0 or an id never handed out.
+    ///
+    /// The registry is shared by the whole process: any thread may register (registration is
+    /// serialised inside) and any thread may look up by id without taking a lock (shading
+    /// threads included). Entries are never removed, so the pointer stays valid. The thread that
+    /// registers a struct fills its fields before handing its id to others; fields do not change
+    /// afterwards.
     static StructSpec* structspec(int id);
 
     /// The id of the most recently registered struct with this name, or 0 when there is none;
