@@ -365,8 +365,9 @@ ConfigSection ConfigManager::Section(std::string_view name) {
 }
 
 ConfigManager& GetConfigManager() {
-    static ConfigManager manager;
-    return manager;
+    // Never destroyed: other static objects may read settings while the process exits.
+    static ConfigManager* manager = new ConfigManager;
+    return *manager;
 }
 
 } // namespace TrelmSDK

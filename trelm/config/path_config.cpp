@@ -1,4 +1,5 @@
 // Numbered host directories under a configurable root, created on demand.
+#include <trelm/config/config_manager.h>
 #include <trelm/config/path_config.h>
 #include <trelm/log/system_log.h>
 
@@ -25,14 +26,18 @@ const std::map<int, std::string_view>& dirTable() {
     return table;
 }
 
-std::vector<std::filesystem::path> splitFolderList(std::string_view list) {
+constexpr std::string_view kSection = "Directories";
+
+std::vector<std::filesystem::path> splitFolderList(std::string_view list, char separator) {
     std::vector<std::filesystem::path> folders;
     while (!list.empty()) {
-        const auto colon = list.find(':');
-        const std::string_view part = list.substr(0, colon);
+        const auto at = list.find(separator);
+        std::string_view part = list.substr(0, at);
+        while (!part.empty() && part.front() == ' ') part.remove_prefix(1);
+        while (!part.empty() && part.back() == ' ') part.remove_suffix(1);
         if (!part.empty()) folders.emplace_back(part);
-        if (colon == std::string_view::npos) break;
-        list.remove_prefix(colon + 1);
+        if (at == std::string_view::npos) break;
+        list.remove_prefix(at + 1);
     }
     return folders;
 }
@@ -53,13 +58,14 @@ std::filesystem::path DefaultTrelmRoot() {
 }
 
 IPathConfigMgr* IPathConfigMgr::GetPathConfigMgr() {
-    static IPathConfigMgr manager;
-    return &manager;
+    // Never destroyed: background threads may ask for folders while the process exits.
+    static IPathConfigMgr* manager = new IPathConfigMgr;
+    return manager;
 }
 
 IPathConfigMgr::IPathConfigMgr() : root_(DefaultTrelmRoot()) {
     if (const char* list = std::getenv("TRELM_ADDITIONAL_FOLDERS"))
-        additional_ = splitFolderList(list);
+        additional_ = splitFolderList(list, ':');
 }
 
 bool IPathConfigMgr::IsKnownDir(int which) {
@@ -114,6 +120,57 @@ bool IPathConfigMgr::SetDir(int which, std::filesystem::path folder) {
     else
         overrides_[which] = std::move(folder);
     return true;
+}
+
+void IPathConfigMgr::LoadFromConfig(ConfigManager& config) {
+    const std::filesystem::path base = config.FilePath().parent_path();
+    auto resolve = [&base](const std::string& text) {
+        const std::filesystem::path path(text);
+        return path.is_absolute() || base.empty() ? path : base / path;
+    };
+    std::lock_guard lock(mutex_);
+    for (const std::string& key : config.Keys(kSection)) {
+        const std::string value = config.GetString(kSection, key).value_or("");
+        std::string lowered;
+        for (char c : key) lowered += static_cast<char>((c >= 'A' && c <= 'Z') ? c - 'A' + 'a' : c);
+        if (lowered == "root") {
+            if (!value.empty()) root_ = resolve(value);
+        } else if (lowered == "additionalfolders") {
+            additional_.clear();
+            for (const auto& folder : splitFolderList(value, ';'))
+                additional_.push_back(resolve(folder.string()));
+        } else if (lowered.starts_with("dir") &&
+                   ConfigManager::ParseInt(std::string_view(key).substr(3)) &&
+                   IsKnownDir(*ConfigManager::ParseInt(std::string_view(key).substr(3)))) {
+            const int which = *ConfigManager::ParseInt(std::string_view(key).substr(3));
+            if (value.empty())
+                overrides_.erase(which);
+            else
+                overrides_[which] = resolve(value);
+        } else {
+            GetSystemLog().LogEntry(SYSLOG_WARN, NO_DIALOG, "Paths",
+                                    config.FilePath().string() + ": [" + std::string(kSection) +
+                                        "] " + key + " is not a known directory setting");
+        }
+    }
+}
+
+bool IPathConfigMgr::SaveToConfig(ConfigManager& config) const {
+    std::string root, additional;
+    std::map<int, std::filesystem::path> overrides;
+    {
+        std::lock_guard lock(mutex_);
+        root = root_.string();
+        overrides = overrides_;
+        for (const auto& folder : additional_) {
+            if (!additional.empty()) additional += ';';
+            additional += folder.string();
+        }
+    }
+    bool ok = config.SetString(kSection, "Root", root);
+    for (const auto& [which, folder] : overrides)
+        ok = config.SetString(kSection, "Dir" + std::to_string(which), folder.string()) && ok;
+    return config.SetString(kSection, "AdditionalFolders", additional) && ok;
 }
 
 std::vector<std::filesystem::path> IPathConfigMgr::GetAdditionalFolders() const {

@@ -57,8 +57,10 @@ std::vector<LogMessage> MessageSink::Snapshot() const {
 
 std::vector<LogMessage> MessageSink::Since(std::uint64_t sequence) const {
     std::lock_guard lock(mutex_);
-    const auto first = std::find_if(messages_.begin(), messages_.end(),
-                                    [&](const LogMessage& m) { return m.sequence > sequence; });
+    // Sequence numbers increase along the queue, so the first newer message is found by halving.
+    const auto first =
+        std::partition_point(messages_.begin(), messages_.end(),
+                             [&](const LogMessage& m) { return m.sequence <= sequence; });
     return {first, messages_.end()};
 }
 

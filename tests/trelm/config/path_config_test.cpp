@@ -1,6 +1,8 @@
 #include "temp_folder.h"
 
+#include <trelm/config/config_manager.h>
 #include <trelm/config/path_config.h>
+#include <trelm/log/system_log.h>
 
 #include <gtest/gtest.h>
 
@@ -87,4 +89,39 @@ TEST(PathConfig, EnvironmentChoosesRootAndAdditionalFolders) {
 
 TEST(PathConfig, ProcessWideManagerIsOne) {
     EXPECT_EQ(IPathConfigMgr::GetPathConfigMgr(), IPathConfigMgr::GetPathConfigMgr());
+}
+
+TEST(PathConfig, TheUserCanSetFoldersInTheConfigurationFile) {
+    TempFolder tmp;
+    const auto ini = tmp.path() / "trelm.ini";
+    trelm_test::writeFile(ini, "[Directories]\nRoot = data\nDir20 = /opt/trelm\n"
+                               "AdditionalFolders = /a ; shaders\nDir9999 = /x\nColour = red\n");
+    ConfigManager config(ini);
+    IPathConfigMgr paths;
+    const auto before = GetSystemLog().Messages().LastSequence();
+    paths.LoadFromConfig(config);
+    EXPECT_EQ(paths.GetRoot(), tmp.path() / "data");
+    EXPECT_EQ(paths.GetDir(20), std::filesystem::path("/opt/trelm"));
+    EXPECT_EQ(paths.GetDir(37), tmp.path() / "data" / "plugcfg");
+    EXPECT_EQ(paths.GetAdditionalFolders(),
+              (std::vector<std::filesystem::path>{"/a", tmp.path() / "shaders"}));
+    EXPECT_EQ(GetSystemLog().Messages().Since(before).size(), 2u);
+    // Reading changes nothing in the file.
+    EXPECT_EQ(trelm_test::readFile(ini).find("Dir37"), std::string::npos);
+}
+
+TEST(PathConfig, SavedSettingsLoadBackIntoAnotherManager) {
+    TempFolder tmp;
+    ConfigManager config(tmp.path() / "trelm.ini");
+    IPathConfigMgr paths;
+    paths.SetRoot(tmp.path() / "root");
+    paths.SetDir(APP_PLUGIN_DATA_DIR, tmp.path() / "cache");
+    paths.SetAdditionalFolders({tmp.path() / "a", tmp.path() / "b"});
+    ASSERT_TRUE(paths.SaveToConfig(config));
+
+    IPathConfigMgr other;
+    other.LoadFromConfig(config);
+    EXPECT_EQ(other.GetRoot(), tmp.path() / "root");
+    EXPECT_EQ(other.GetDir(37), tmp.path() / "cache");
+    EXPECT_EQ(other.GetAdditionalFolders(), paths.GetAdditionalFolders());
 }

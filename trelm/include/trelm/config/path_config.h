@@ -10,6 +10,8 @@
 
 namespace TrelmSDK {
 
+class ConfigManager;
+
 // Directory identifiers. 20 and 37 are the ones the module asks for; the others serve the host.
 enum : int {
     APP_SCENE_DIR = 1,          // scenes: <root>/scenes
@@ -52,6 +54,16 @@ public:
     // False for an unknown identifier.
     bool SetDir(int which, std::filesystem::path folder);
     static bool IsKnownDir(int which);
+
+    // Applies the section "Directories" of a configuration, which the user may edit: "Root" (the
+    // root folder), "Dir<N>" (a folder of its own for identifier N, e.g. Dir20) and
+    // "AdditionalFolders" (folders separated by ';'). Relative paths are taken from the
+    // configuration file's folder. Missing keys leave the current setting and nothing is written
+    // back, so an unset root keeps following the environment. Unusable keys are reported to the
+    // system log and skipped.
+    void LoadFromConfig(ConfigManager& config);
+    // Writes the current root, own folders and additional folders into that section.
+    bool SaveToConfig(ConfigManager& config) const;
 
     std::vector<std::filesystem::path> GetAdditionalFolders() const;
     void SetAdditionalFolders(std::vector<std::filesystem::path> folders);
