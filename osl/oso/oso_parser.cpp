@@ -20,7 +20,7 @@ using oso::TokenKind;
 
 // Longest array the reader accepts: beyond it a query's default storage would be unreasonably
 // large, and no real shader comes close.
-constexpr int kMaxArrayLength = 1 << 20;
+constexpr int kMaxArrayLength = 1 << 16;
 
 // Struct nesting deeper than this is treated as malformed (it also bounds recursion).
 constexpr int kMaxStructDepth = 64;
