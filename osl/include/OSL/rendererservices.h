@@ -107,7 +107,7 @@ public:
 protected:
     TextureSystem* m_texturesys;
 
-    friend class ShadingSystem;
+    friend class ShadingSystemImpl;
 };
 
 } // namespace OSL

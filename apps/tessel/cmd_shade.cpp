@@ -1,0 +1,536 @@
+// `tessel shade`: runs a shader group over a grid of shading points the way OSL's testshade
+// does, with its command line, its console output and its images (through OpenImageIO).
+#include "command_registry.h"
+
+#include <OSL/oslclosure.h>
+#include <OSL/oslexec.h>
+
+#include <OpenImageIO/filesystem.h>
+#include <OpenImageIO/imagebuf.h>
+#include <OpenImageIO/strutil.h>
+
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <iostream>
+#include <map>
+#include <memory>
+#include <string>
+#include <thread>
+#include <vector>
+
+namespace {
+
+using namespace OSL;
+
+// Every message goes to stdout in the order it is made, so that shader output, warnings and
+// errors interleave as they happened.
+class ConsoleErrors final : public ErrorHandler {
+public:
+    void operator()(int errcode, const std::string& msg) override {
+        switch (errcode & 0xffff0000) {
+        case EH_ERROR: std::printf("ERROR: %s\n", msg.c_str()); break;
+        case EH_SEVERE: std::printf("SEVERE ERROR: %s\n", msg.c_str()); break;
+        case EH_WARNING: std::printf("WARNING: %s\n", msg.c_str()); break;
+        case EH_INFO: std::printf("%s\n", msg.c_str()); break;
+        default: std::printf("%s", msg.c_str()); break;
+        }
+        std::fflush(stdout);
+    }
+};
+
+// The renderer of the grid: "shader" and "object" space are fixed transformations, and
+// "camera" and "world" coincide with common space.
+class GridRenderer final : public RendererServices {
+public:
+    GridRenderer() {
+        m_shader.translate(Vec3(1.0f, 0.0f, 0.0f));
+        m_shader.rotate(Vec3(0.0f, 0.0f, float(M_PI_4)));
+        m_object.translate(Vec3(0.0f, 1.0f, 0.0f));
+        m_object.rotate(Vec3(0.0f, 0.0f, float(M_PI_2)));
+        m_named[ustring("camera")] = Matrix44();
+        m_named[ustring("world")] = Matrix44();
+    }
+    bool get_matrix(ShaderGlobals*, Matrix44& result, TransformationPtr xform, float) override {
+        if (!xform) return false;
+        result = *static_cast<const Matrix44*>(xform);
+        return true;
+    }
+    bool get_matrix(ShaderGlobals*, Matrix44& result, ustring from, float) override {
+        auto it = m_named.find(from);
+        if (it == m_named.end()) return false;
+        result = it->second;
+        return true;
+    }
+    bool get_matrix(ShaderGlobals* sg, Matrix44& result, TransformationPtr xform) override {
+        return get_matrix(sg, result, xform, 0.0f);
+    }
+    bool get_matrix(ShaderGlobals* sg, Matrix44& result, ustring from) override {
+        return get_matrix(sg, result, from, 0.0f);
+    }
+    const Matrix44* shaderMatrix() const { return &m_shader; }
+    const Matrix44* objectMatrix() const { return &m_object; }
+
+private:
+    Matrix44 m_shader, m_object;
+    std::map<ustring, Matrix44> m_named;
+};
+
+// The closures a renderer of this kind knows, in the layouts OSL's test renderers use.
+struct EmptyParams {};
+struct DiffuseParams {
+    Vec3 N;
+    ustring label;
+};
+struct OrenNayarParams {
+    Vec3 N;
+    float sigma;
+};
+struct TranslucentParams {
+    Vec3 N;
+    ustring label;
+};
+struct PhongParams {
+    Vec3 N;
+    float exponent;
+    ustring label;
+};
+struct WardParams {
+    Vec3 N, T;
+    float ax, ay;
+};
+struct MicrofacetParams {
+    ustring dist;
+    Vec3 N, U;
+    float xalpha, yalpha, eta;
+    int refract;
+};
+struct ReflectionParams {
+    Vec3 N;
+    float eta;
+};
+struct DebugParams {
+    ustring tag;
+};
+
+void registerClosures(ShadingSystem& ss) {
+    const ClosureParam none[] = {CLOSURE_FINISH_PARAM(EmptyParams)};
+    const ClosureParam diffuse[] = {CLOSURE_VECTOR_PARAM(DiffuseParams, N),
+                                    CLOSURE_STRING_KEYPARAM(DiffuseParams, label, "label"),
+                                    CLOSURE_FINISH_PARAM(DiffuseParams)};
+    const ClosureParam oren[] = {CLOSURE_VECTOR_PARAM(OrenNayarParams, N),
+                                 CLOSURE_FLOAT_PARAM(OrenNayarParams, sigma),
+                                 CLOSURE_FINISH_PARAM(OrenNayarParams)};
+    const ClosureParam translucent[] = {CLOSURE_VECTOR_PARAM(TranslucentParams, N),
+                                        CLOSURE_FINISH_PARAM(TranslucentParams)};
+    const ClosureParam phong[] = {CLOSURE_VECTOR_PARAM(PhongParams, N),
+                                  CLOSURE_FLOAT_PARAM(PhongParams, exponent),
+                                  CLOSURE_STRING_KEYPARAM(PhongParams, label, "label"),
+                                  CLOSURE_FINISH_PARAM(PhongParams)};
+    const ClosureParam ward[] = {CLOSURE_VECTOR_PARAM(WardParams, N),
+                                 CLOSURE_VECTOR_PARAM(WardParams, T),
+                                 CLOSURE_FLOAT_PARAM(WardParams, ax),
+                                 CLOSURE_FLOAT_PARAM(WardParams, ay),
+                                 CLOSURE_FINISH_PARAM(WardParams)};
+    const ClosureParam microfacet[] = {CLOSURE_STRING_PARAM(MicrofacetParams, dist),
+                                       CLOSURE_VECTOR_PARAM(MicrofacetParams, N),
+                                       CLOSURE_VECTOR_PARAM(MicrofacetParams, U),
+                                       CLOSURE_FLOAT_PARAM(MicrofacetParams, xalpha),
+                                       CLOSURE_FLOAT_PARAM(MicrofacetParams, yalpha),
+                                       CLOSURE_FLOAT_PARAM(MicrofacetParams, eta),
+                                       CLOSURE_INT_PARAM(MicrofacetParams, refract),
+                                       CLOSURE_FINISH_PARAM(MicrofacetParams)};
+    const ClosureParam reflection[] = {CLOSURE_VECTOR_PARAM(ReflectionParams, N),
+                                       CLOSURE_FINISH_PARAM(ReflectionParams)};
+    const ClosureParam fresnel[] = {CLOSURE_VECTOR_PARAM(ReflectionParams, N),
+                                    CLOSURE_FLOAT_PARAM(ReflectionParams, eta),
+                                    CLOSURE_FINISH_PARAM(ReflectionParams)};
+    const ClosureParam debug[] = {CLOSURE_STRING_PARAM(DebugParams, tag),
+                                  CLOSURE_FINISH_PARAM(DebugParams)};
+    ss.register_closure("emission", 1, none, nullptr, nullptr);
+    ss.register_closure("background", 2, none, nullptr, nullptr);
+    ss.register_closure("diffuse", 3, diffuse, nullptr, nullptr);
+    ss.register_closure("oren_nayar", 4, oren, nullptr, nullptr);
+    ss.register_closure("translucent", 5, translucent, nullptr, nullptr);
+    ss.register_closure("phong", 6, phong, nullptr, nullptr);
+    ss.register_closure("ward", 7, ward, nullptr, nullptr);
+    ss.register_closure("microfacet", 8, microfacet, nullptr, nullptr);
+    ss.register_closure("reflection", 9, reflection, nullptr, nullptr);
+    ss.register_closure("reflection", 10, fresnel, nullptr, nullptr);
+    ss.register_closure("refraction", 11, fresnel, nullptr, nullptr);
+    ss.register_closure("transparent", 12, none, nullptr, nullptr);
+    ss.register_closure("debug", 13, debug, nullptr, nullptr);
+    ss.register_closure("holdout", 14, none, nullptr, nullptr);
+}
+
+struct OutputRequest {
+    std::string symbol, file;
+    TypeDesc dataType = TypeDesc::FLOAT;
+};
+
+struct ShadeOptions {
+    int xres = 1, yres = 1;
+    int threads = 1;
+    int iters = 1;
+    bool center = false, varyPdxdy = false, varyUdxdy = false, varyVdxdy = false;
+    bool print = false;
+    float uoffset = 0, voffset = 0, uscale = 1, vscale = 1;
+    std::string raytype = "camera";
+    std::vector<OutputRequest> outputs;
+    std::vector<std::string> entryLayers;
+};
+
+// A --param value, typed as testshade types it: explicit ":type=", else int, float or string.
+bool setParam(ShadingSystem& ss, ShaderGroup& g, std::string command, const std::string& name,
+              const std::string& value) {
+    std::string type;
+    bool lockgeom = true;
+    for (const std::string& opt : OIIO::Strutil::splits(command, ":")) {
+        if (OIIO::Strutil::starts_with(opt, "type=")) type = opt.substr(5);
+        if (OIIO::Strutil::starts_with(opt, "lockgeom=")) lockgeom = std::atoi(opt.c_str() + 9) != 0;
+    }
+    TypeDesc t;
+    if (!type.empty()) {
+        t = TypeDesc(type.c_str());
+    } else if (OIIO::Strutil::string_is_int(value)) {
+        t = TypeInt;
+    } else if (OIIO::Strutil::string_is_float(value)) {
+        t = TypeFloat;
+    } else {
+        t = TypeString;
+    }
+    if (t.basetype == TypeDesc::UNKNOWN) {
+        std::printf("ERROR: unknown parameter type \"%s\"\n", type.c_str());
+        return false;
+    }
+    const std::vector<std::string> parts = OIIO::Strutil::splits(value, ",");
+    const size_t count = t.numelements() * t.aggregate;
+    if (t.basetype == TypeDesc::STRING) {
+        std::vector<ustring> v(count);
+        for (size_t k = 0; k < count; ++k)
+            v[k] = ustring(count == 1 ? value : (k < parts.size() ? parts[k] : std::string()));
+        return ss.Parameter(g, name, t, v.data(), lockgeom);
+    }
+    if (t.basetype == TypeDesc::INT) {
+        std::vector<int> v(count);
+        for (size_t k = 0; k < count; ++k)
+            v[k] = OIIO::Strutil::stoi(parts.empty() ? value : parts[std::min(k, parts.size() - 1)]);
+        return ss.Parameter(g, name, t, v.data(), lockgeom);
+    }
+    std::vector<float> v(count);
+    for (size_t k = 0; k < count; ++k)
+        v[k] = OIIO::Strutil::stof(parts.empty() ? value : parts[std::min(k, parts.size() - 1)]);
+    return ss.Parameter(g, name, t, v.data(), lockgeom);
+}
+
+void setupGlobals(ShaderGlobals& sg, const ShadeOptions& o, const GridRenderer& r, int raytypeBit,
+                  int x, int y) {
+    std::memset(static_cast<void*>(&sg), 0, sizeof sg);
+    sg.renderstate = &sg;
+    sg.shader2common = r.shaderMatrix();
+    sg.object2common = r.objectMatrix();
+    sg.raytype = raytypeBit;
+    if (o.center) {
+        sg.u = o.uscale * (float(x) + 0.5f) / float(o.xres) + o.uoffset;
+        sg.v = o.vscale * (float(y) + 0.5f) / float(o.yres) + o.voffset;
+        sg.dudx = o.uscale / float(o.xres);
+        sg.dvdy = o.vscale / float(o.yres);
+    } else {
+        sg.u = o.uscale * (o.xres == 1 ? 0.5f : float(x) / float(o.xres - 1)) + o.uoffset;
+        sg.v = o.vscale * (o.yres == 1 ? 0.5f : float(y) / float(o.yres - 1)) + o.voffset;
+        sg.dudx = o.uscale / float(std::max(1, o.xres - 1));
+        sg.dvdy = o.vscale / float(std::max(1, o.yres - 1));
+    }
+    if (o.varyUdxdy) sg.dudx = 1.0f - sg.u, sg.dudy = sg.u;
+    if (o.varyVdxdy) sg.dvdx = 1.0f - sg.v, sg.dvdy = sg.v;
+    sg.P = Vec3(sg.u, sg.v, 1.0f);
+    if (o.varyPdxdy) {
+        sg.dPdx = Vec3(1.0f - sg.u, 1.0f - sg.v, sg.u * 0.5f);
+        sg.dPdy = Vec3(1.0f - sg.v, 1.0f - sg.u, sg.v * 0.5f);
+    } else {
+        sg.dPdx = Vec3(sg.dudx, sg.dudy, 0.0f);
+        sg.dPdy = Vec3(sg.dvdx, sg.dvdy, 0.0f);
+    }
+    sg.dPdu = Vec3(1.0f, 0.0f, 0.0f);
+    sg.dPdv = Vec3(0.0f, 1.0f, 0.0f);
+    sg.N = Vec3(0.0f, 0.0f, 1.0f);
+    sg.Ng = Vec3(0.0f, 0.0f, 1.0f);
+    sg.surfacearea = 1.0f;
+}
+
+struct OutputImage {
+    const ShaderSymbol* sym = nullptr;
+    TypeDesc type;
+    int channels = 0;
+    std::unique_ptr<OIIO::ImageBuf> buf;
+};
+
+// Copies the values of the output symbols at one shading point into the images.
+void gatherOutputs(ShadingSystem& ss, ShadingContext& ctx, std::vector<OutputImage>& images,
+                   int x, int y) {
+    for (OutputImage& img : images) {
+        if (!img.sym || !img.buf) continue;
+        const void* data = ss.symbol_address(ctx, img.sym);
+        if (!data) continue;
+        float px[16] = {};
+        const TypeDesc t = img.type;
+        for (int c = 0; c < img.channels; ++c) {
+            if (t.basetype == TypeDesc::FLOAT)
+                px[c] = static_cast<const float*>(data)[c];
+            else if (t.basetype == TypeDesc::INT)
+                px[c] = float(static_cast<const int*>(data)[c]);
+        }
+        img.buf->setpixel(x, y, px, img.channels);
+    }
+}
+
+int runShade(const std::vector<std::string>& args) {
+    ConsoleErrors errors;
+    GridRenderer renderer;
+    ShadeOptions opt;
+    ShadingSystem ss(&renderer, nullptr, &errors);
+    registerClosures(ss);
+    ss.attribute("lockgeom", 1);
+
+    ShaderGroupRef group;
+    std::string groupName, groupSpec, pendingLayer;
+    bool failed = false;
+    auto ensureGroup = [&]() {
+        if (!group) group = ss.ShaderGroupBegin(groupName);
+    };
+
+    for (size_t i = 0; i < args.size(); ++i) {
+        const std::string& a = args[i];
+        auto need = [&](size_t n) {
+            if (i + n >= args.size()) {
+                std::printf("ERROR: %s needs %zu argument(s)\n", a.c_str(), n);
+                failed = true;
+                return false;
+            }
+            return true;
+        };
+        std::string base = a;
+        while (base.size() > 1 && base[0] == '-' && base[1] == '-') base = base.substr(1);
+        if (base == "-g" || base == "-res") {
+            if (!need(2)) break;
+            opt.xres = std::max(1, std::atoi(args[i + 1].c_str()));
+            opt.yres = std::max(1, std::atoi(args[i + 2].c_str()));
+            i += 2;
+        } else if (base == "-o") {
+            if (!need(2)) break;
+            opt.outputs.push_back({args[i + 1], args[i + 2], TypeDesc::FLOAT});
+            i += 2;
+        } else if (base == "-od" || base == "-d") {
+            if (!need(1)) break;
+            TypeDesc t(args[i + 1].c_str());
+            for (OutputRequest& o : opt.outputs) o.dataType = t;
+            ++i;
+        } else if (base == "-t") {
+            if (!need(1)) break;
+            opt.threads = std::max(1, std::atoi(args[i + 1].c_str()));
+            ++i;
+        } else if (base == "-iters") {
+            if (!need(1)) break;
+            opt.iters = std::max(1, std::atoi(args[i + 1].c_str()));
+            ++i;
+        } else if (base == "-center") {
+            opt.center = true;
+        } else if (base == "-vary_pdxdy") {
+            opt.varyPdxdy = true;
+        } else if (base == "-vary_udxdy") {
+            opt.varyUdxdy = true;
+        } else if (base == "-vary_vdxdy") {
+            opt.varyVdxdy = true;
+        } else if (base == "-print") {
+            opt.print = true;
+        } else if (base == "-offsetuv") {
+            if (!need(2)) break;
+            opt.uoffset = OIIO::Strutil::stof(args[i + 1]);
+            opt.voffset = OIIO::Strutil::stof(args[i + 2]);
+            i += 2;
+        } else if (base == "-scaleuv") {
+            if (!need(2)) break;
+            opt.uscale = OIIO::Strutil::stof(args[i + 1]);
+            opt.vscale = OIIO::Strutil::stof(args[i + 2]);
+            i += 2;
+        } else if (base == "-raytype") {
+            if (!need(1)) break;
+            opt.raytype = args[++i];
+        } else if (base == "-raytype_opt") {
+        } else if (base == "-O0" || base == "-O1" || base == "-O2" || base == "-O") {
+            ss.attribute("optimize", base == "-O0" ? 0 : base == "-O1" ? 1 : 2);
+        } else if (base == "-debug" || base == "-debug2" || base == "-v" || base == "-stats" ||
+                   base == "-runstats" || base == "-llvm_debug") {
+        } else if (base == "-debugnan") {
+            ss.attribute("debug_nan", 1);
+        } else if (base == "-debuguninit") {
+            ss.attribute("debug_uninit", 1);
+        } else if (base == "-groupname") {
+            if (!need(1)) break;
+            groupName = args[++i];
+        } else if (base == "-group") {
+            if (!need(1)) break;
+            groupSpec = args[++i];
+            std::string text;
+            if (OIIO::Filesystem::read_text_file(groupSpec, text)) groupSpec = text;
+            group = ss.ShaderGroupBegin(groupName, "surface", groupSpec);
+        } else if (base == "-options") {
+            if (!need(1)) break;
+            for (const std::string& kv : OIIO::Strutil::splits(args[++i], ",")) {
+                const size_t eq = kv.find('=');
+                if (eq == std::string::npos) continue;
+                const std::string k = kv.substr(0, eq), v = kv.substr(eq + 1);
+                if (OIIO::Strutil::string_is_int(v))
+                    ss.attribute(k, OIIO::Strutil::stoi(v));
+                else if (OIIO::Strutil::string_is_float(v))
+                    ss.attribute(k, OIIO::Strutil::stof(v));
+                else
+                    ss.attribute(k, string_view(v));
+            }
+        } else if (base == "-texoptions") {
+            if (!need(1)) break;
+            ss.texturesys()->attribute("options", args[++i]);
+        } else if (base == "-entry") {
+            if (!need(1)) break;
+            opt.entryLayers.push_back(args[++i]);
+        } else if (OIIO::Strutil::starts_with(base, "-param")) {
+            if (!need(2)) break;
+            ensureGroup();
+            setParam(ss, *group, base, args[i + 1], args[i + 2]);
+            i += 2;
+        } else if (base == "-layer") {
+            if (!need(1)) break;
+            pendingLayer = args[++i];
+        } else if (base == "-shader") {
+            if (!need(2)) break;
+            ensureGroup();
+            if (!ss.Shader(*group, "surface", args[i + 1], args[i + 2])) failed = true;
+            i += 2;
+        } else if (base == "-connect") {
+            if (!need(4)) break;
+            ensureGroup();
+            std::printf("Connect %s.%s to %s.%s\n", args[i + 1].c_str(), args[i + 2].c_str(),
+                        args[i + 3].c_str(), args[i + 4].c_str());
+            std::fflush(stdout);
+            if (!ss.ConnectShaders(*group, args[i + 1], args[i + 2], args[i + 3], args[i + 4]))
+                failed = true;
+            i += 4;
+        } else if (base == "-reparam" || base == "-userdata" || base == "-expr" ||
+                   base == "-entryoutput" || base == "-groupoutputs") {
+            std::printf("ERROR: tessel shade does not support %s yet\n", a.c_str());
+            return 1;
+        } else if (!a.empty() && a[0] == '-') {
+            std::printf("ERROR: unknown option %s\n", a.c_str());
+            return 1;
+        } else {
+            ensureGroup();
+            const std::string layer = pendingLayer.empty() ? a : pendingLayer;
+            pendingLayer.clear();
+            if (!ss.Shader(*group, "surface", a, layer)) failed = true;
+        }
+    }
+    if (!group) {
+        std::printf("ERROR: No shader specified\n");
+        return 1;
+    }
+    if (failed) {
+        ss.ShaderGroupEnd(*group);
+        return 1;
+    }
+
+    if (!opt.outputs.empty()) {
+        std::vector<ustring> names;
+        for (const OutputRequest& o : opt.outputs) names.emplace_back(o.symbol);
+        ss.attribute(group.get(), "renderer_outputs",
+                     TypeDesc(TypeDesc::STRING, int(names.size())), names.data());
+    }
+    if (!opt.entryLayers.empty()) {
+        std::vector<ustring> names;
+        for (const std::string& e : opt.entryLayers) names.emplace_back(e);
+        ss.attribute(group.get(), "entry_layers", TypeDesc(TypeDesc::STRING, int(names.size())),
+                     names.data());
+    }
+    if (!ss.ShaderGroupEnd(*group)) return 1;
+
+    std::vector<OutputImage> images(opt.outputs.size());
+    if (!opt.outputs.empty()) std::printf("\n");
+    for (size_t k = 0; k < opt.outputs.size(); ++k) {
+        const OutputRequest& o = opt.outputs[k];
+        std::printf("Output %s to %s\n", o.symbol.c_str(), o.file.c_str());
+        OutputImage& img = images[k];
+        img.sym = ss.find_symbol(*group, ustring(o.symbol));
+        if (!img.sym) {
+            std::printf("ERROR: Output %s not found, skipping.\n", o.symbol.c_str());
+            continue;
+        }
+        img.type = ss.symbol_typedesc(img.sym);
+        img.channels = int(img.type.aggregate) * std::max(1, img.type.arraylen);
+        if (img.type.basetype != TypeDesc::FLOAT && img.type.basetype != TypeDesc::INT) {
+            std::printf("ERROR: Output %s is not numeric, skipping.\n", o.symbol.c_str());
+            img.sym = nullptr;
+            continue;
+        }
+        OIIO::ImageSpec spec(opt.xres, opt.yres, img.channels, o.dataType);
+        img.buf = std::make_unique<OIIO::ImageBuf>(spec);
+    }
+    std::fflush(stdout);
+
+    const int raytypeBit = ss.raytype_bit(ustring(opt.raytype));
+    const int nthreads = std::min(opt.threads, opt.yres);
+    auto shadeRows = [&](int y0, int y1) {
+        PerThreadInfo* ti = ss.create_thread_info();
+        ShadingContext* ctx = ss.get_context(ti);
+        ShaderGlobals sg;
+        for (int iter = 0; iter < opt.iters; ++iter)
+            for (int y = y0; y < y1; ++y)
+                for (int x = 0; x < opt.xres; ++x) {
+                    setupGlobals(sg, opt, renderer, raytypeBit, x, y);
+                    ss.execute(*ctx, *group, 0, sg, nullptr, nullptr);
+                    if (iter == opt.iters - 1) gatherOutputs(ss, *ctx, images, x, y);
+                }
+        ss.release_context(ctx);
+        ss.destroy_thread_info(ti);
+    };
+    if (nthreads <= 1) {
+        shadeRows(0, opt.yres);
+    } else {
+        std::vector<std::thread> pool;
+        for (int t = 0; t < nthreads; ++t)
+            pool.emplace_back(shadeRows, opt.yres * t / nthreads, opt.yres * (t + 1) / nthreads);
+        for (std::thread& th : pool) th.join();
+    }
+
+    int status = 0;
+    std::printf("\n");
+    for (size_t k = 0; k < images.size(); ++k) {
+        OutputImage& img = images[k];
+        if (!img.buf) continue;
+        if (opt.print) {
+            for (int y = 0; y < opt.yres; ++y)
+                for (int x = 0; x < opt.xres; ++x) {
+                    std::printf("Pixel (%d, %d):\n  %s :", x, y, opt.outputs[k].symbol.c_str());
+                    for (int c = 0; c < img.channels; ++c)
+                        std::printf(" %g", double(img.buf->getchannel(x, y, 0, c)));
+                    std::printf("\n");
+                }
+        }
+        if (!img.buf->write(opt.outputs[k].file)) {
+            std::printf("ERROR: cannot write %s: %s\n", opt.outputs[k].file.c_str(),
+                        img.buf->geterror().c_str());
+            status = 1;
+        }
+    }
+    std::fflush(stdout);
+    return status;
+}
+
+const tessel_cli::CommandRegistrar registrar{
+    "shade", "Run a shader group over a grid of points (testshade's options)",
+    [](CLI::App& sub) -> std::function<int()> {
+        sub.allow_extras();
+        sub.prefix_command();
+        sub.set_help_flag();
+        return [&sub] { return runShade(sub.remaining()); };
+    }};
+
+} // namespace

@@ -1,0 +1,21 @@
+// Named coordinate systems (through the renderer services) and colour spaces.
+#pragma once
+
+#include "shading_context.h"
+
+#include <OSL/dual.h>
+
+namespace OSL {
+
+// The matrix from `space` to common (toCommon) or from common to `space`; identity and false
+// when the renderer does not know the space.
+bool getSpaceMatrix(ExecState& st, ustring space, Matrix44& m, bool toCommon);
+
+// Transforms a value with derivatives as a point (0), vector (1) or normal (2).
+Dual2<Vec3> transformDual(const Matrix44& m, const Dual2<Vec3>& v, int kind);
+
+// Conversions between linear RGB and the named colour spaces (rgb, hsv, hsl, YIQ, XYZ, xyY).
+bool colorFromSpace(ustring space, const Vec3& c, Vec3& rgb);
+bool colorToSpace(ustring space, const Vec3& rgb, Vec3& c);
+
+} // namespace OSL
