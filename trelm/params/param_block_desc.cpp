@@ -81,7 +81,7 @@ const TagArg* Next(const std::vector<TagArg>& args, size_t& i) {
 }
 } // namespace
 
-ParamBlockDesc2::ParamBlockDesc2(BlockID id, const MCHAR* int_name, StringResID local_name,
+ParamBlockDesc2::ParamBlockDesc2(Header, BlockID id, const MCHAR* int_name, StringResID local_name,
                                  ClassDesc2* cd, int flags)
     : id_(id), int_name_(int_name ? int_name : L""), local_name_(local_name), cd_(cd),
       flags_(flags) {

@@ -58,7 +58,7 @@ public:
     template <class... Args>
     ParamBlockDesc2(BlockID id, const MCHAR* int_name, StringResID local_name, ClassDesc2* cd,
                     int flags, Args&&... args)
-        : ParamBlockDesc2(id, int_name, local_name, cd, flags) {
+        : ParamBlockDesc2(Header{}, id, int_name, local_name, cd, flags) {
         if constexpr (sizeof...(Args) > 0)
             ParseHeaderAndParams(std::vector<TagArg>{TagArg(std::forward<Args>(args))...});
         else
@@ -112,8 +112,9 @@ public:
 
 private:
     friend class ClassDesc2;
-    ParamBlockDesc2(BlockID id, const MCHAR* int_name, StringResID local_name, ClassDesc2* cd,
-                    int flags);
+    struct Header {};
+    ParamBlockDesc2(Header, BlockID id, const MCHAR* int_name, StringResID local_name,
+                    ClassDesc2* cd, int flags);
     void ParseHeaderAndParams(const std::vector<TagArg>& args);
     bool ParseParam(ParamID id, const std::vector<TagArg>& args);
     bool ParseOption(ParamID id, uint32_t tag, const std::vector<TagArg>& args);
