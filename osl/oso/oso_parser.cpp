@@ -4,6 +4,7 @@
 #include "oso_parser.h"
 
 #include "oso_tokenizer.h"
+#include "struct_registry.h"
 
 #include <OpenImageIO/strutil.h>
 
@@ -242,7 +243,7 @@ private:
             }
             spec->add_field(type, ustring(names[f]));
         }
-        sym.structid = find_or_register(std::move(spec));
+        sym.structid = find_or_register_struct(std::move(spec));
         return sym.structid;
     }
 
@@ -251,22 +252,6 @@ private:
         if (it == m_struct_symbols.end() || depth >= kMaxStructDepth) return TypeSpec();
         const int id = id_for(*it->second, depth + 1);
         return id ? TypeSpec("", id, arraylen) : TypeSpec();
-    }
-
-    static int find_or_register(std::unique_ptr<StructSpec> spec) {
-        const auto list = TypeSpec::struct_list();
-        for (int i = (int)list.size() - 1; i > 0; --i)
-            if (list[i] && list[i]->name() == spec->name() && same_fields(*list[i], *spec))
-                return i;
-        return TypeSpec::new_struct(spec.release());
-    }
-
-    static bool same_fields(const StructSpec& a, const StructSpec& b) {
-        if (a.numfields() != b.numfields()) return false;
-        for (int i = 0; i < a.numfields(); ++i)
-            if (a.field(i).name != b.field(i).name || a.field(i).type != b.field(i).type)
-                return false;
-        return true;
     }
 
     std::string m_shadername;

@@ -2,6 +2,8 @@
 // by id.
 #include <OSL/typespec.h>
 
+#include "struct_registry.h"
+
 #include <OpenImageIO/strutil.h>
 
 #include <array>
@@ -118,6 +120,22 @@ std::vector<std::shared_ptr<StructSpec>> TypeSpec::struct_list() {
     StructRegistry& r = registry();
     std::lock_guard<std::mutex> lock(r.mutex);
     return r.owned;
+}
+
+static bool same_fields(const StructSpec& a, const StructSpec& b) {
+    if (a.numfields() != b.numfields()) return false;
+    for (int i = 0; i < a.numfields(); ++i)
+        if (a.field(i).name != b.field(i).name || a.field(i).type != b.field(i).type) return false;
+    return true;
+}
+
+int find_or_register_struct(std::unique_ptr<StructSpec> spec) {
+    if (!spec) return 0;
+    StructRegistry& r = registry();
+    std::lock_guard<std::mutex> lock(r.mutex);
+    for (int i = (int)r.owned.size() - 1; i > 0; --i)
+        if (r.owned[i]->name() == spec->name() && same_fields(*r.owned[i], *spec)) return i;
+    return r.add(std::shared_ptr<StructSpec>(spec.release()));
 }
 
 static bool equivalent(const StructSpec* a, const StructSpec* b) {
