@@ -1,0 +1,821 @@
+// Declarations, statements and symbols of the code generator. Expressions live in
+// codegen_expr.cpp.
+#include "codegen.h"
+
+#include <algorithm>
+#include <cmath>
+
+namespace OSL::pvt {
+
+std::string FunctionSymbol::signature() const {
+    std::string s = ret.string() + " " + name + " (";
+    for (size_t i = 0; i < params.size(); ++i) {
+        if (i) s += ", ";
+        if (params[i].output) s += "output ";
+        s += params[i].type.string();
+    }
+    if (variadic) s += params.empty() ? "..." : ", ...";
+    return s + ")";
+}
+
+CodeGen::CodeGen(Diagnostics& diag, const std::vector<std::string>& files)
+    : m_diag(diag), m_files(files) {
+    m_nonWritableGlobals = {"u",    "v",     "I",       "Ng",   "dPdu", "dPdv", "Ps",
+                            "time", "dtime", "dPdtime", "dPdx", "dPdy", "dPdz"};
+}
+
+CodeGen::~CodeGen() = default;
+
+const std::string& CodeGen::fileOf(const Node* n) const {
+    static const std::string none;
+    return n && size_t(n->file) < m_files.size() ? m_files[n->file] : none;
+}
+
+void CodeGen::error(const Node* at, const std::string& msg) {
+    if (m_silent) return;
+    m_diag.error(fileOf(at), at ? at->line : 0, msg);
+}
+
+void CodeGen::warning(const Node* at, const std::string& msg) {
+    if (m_silent) return;
+    m_diag.warning(fileOf(at), at ? at->line : 0, msg);
+}
+
+TypeSpec CodeGen::resolveType(const TypeName& tn, const Node* at) {
+    static const std::map<std::string, TypeDesc> simple = {
+        {"int", TypeDesc::TypeInt},        {"float", TypeDesc::TypeFloat},
+        {"point", TypeDesc::TypePoint},    {"vector", TypeDesc::TypeVector},
+        {"normal", TypeDesc::TypeNormal},  {"color", TypeDesc::TypeColor},
+        {"matrix", TypeDesc::TypeMatrix},  {"string", TypeDesc::TypeString},
+        {"void", TypeDesc(TypeDesc::NONE)}};
+    TypeSpec t;
+    auto it = simple.find(tn.name);
+    if (it != simple.end()) {
+        t = tn.closure ? TypeSpec(it->second, true) : TypeSpec(it->second);
+    } else {
+        auto st = m_structs.find(tn.name);
+        if (st == m_structs.end()) {
+            error(at, "Unknown type '" + tn.name + "'");
+            return TypeSpec(TypeDesc::TypeFloat);
+        }
+        t = TypeSpec(tn.name.c_str(), st->second);
+    }
+    if (tn.arraylen) t.make_array(tn.arraylen);
+    return t;
+}
+
+Symbol* CodeGen::newSymbol(const std::string& name, const TypeSpec& t, SymType st) {
+    m_pool.push_back(std::make_unique<Symbol>());
+    Symbol* s = m_pool.back().get();
+    s->name = name;
+    s->type = t;
+    s->symtype = st;
+    if (!m_checkOnly) m_symbols.push_back(s);
+    return s;
+}
+
+Symbol* CodeGen::newStructSymbol(const std::string& name, const TypeSpec& t, SymType st) {
+    Symbol* s = newSymbol(name, t, st);
+    if (!t.is_structure_based()) return s;
+    StructSpec* spec = t.structspec();
+    for (int i = 0; spec && i < spec->numfields(); ++i) {
+        TypeSpec ft = spec->field(i).type;
+        if (t.is_array()) {
+            if (ft.is_structure_based())
+                ft = TypeSpec(spec->field(i).type.structspec()->name().c_str(), ft.structure(),
+                              t.arraylength());
+            else
+                ft.make_array(t.arraylength());
+        }
+        Symbol* f = newStructSymbol(name + "." + spec->field(i).name.string(), ft, st);
+        f->structParent = s;
+        f->fieldIndex = i;
+        s->fields.push_back(f);
+    }
+    return s;
+}
+
+Symbol* CodeGen::temp(const TypeSpec& t) {
+    return newStructSymbol("$tmp" + std::to_string(++m_tmpCount), t, SymTypeTemp);
+}
+
+Symbol* CodeGen::constant(const TypeSpec& t, const std::vector<int>& iv,
+                          const std::vector<float>& fv, const std::vector<std::string>& sv) {
+    std::string key = t.string() + "|";
+    for (int i : iv) key += std::to_string(i) + ",";
+    for (float f : fv) {
+        char buf[32];
+        std::snprintf(buf, sizeof buf, "%a,", f);
+        key += buf;
+    }
+    for (const auto& s : sv) key += std::to_string(s.size()) + ":" + s + ",";
+    auto it = m_constCache.find(key);
+    if (it != m_constCache.end()) {
+        if (!m_checkOnly &&
+            std::find(m_symbols.begin(), m_symbols.end(), it->second) == m_symbols.end())
+            m_symbols.push_back(it->second);
+        return it->second;
+    }
+    Symbol* s = newSymbol("$const" + std::to_string(++m_constCount), t, SymTypeConst);
+    s->ivals = iv;
+    s->fvals = fv;
+    s->svals = sv;
+    m_constCache[key] = s;
+    return s;
+}
+
+Symbol* CodeGen::constInt(int v) {
+    return constant(TypeSpec(TypeDesc::TypeInt), {v}, {}, {});
+}
+Symbol* CodeGen::constFloat(float v) {
+    return constant(TypeSpec(TypeDesc::TypeFloat), {}, {v}, {});
+}
+Symbol* CodeGen::constString(const std::string& s) {
+    return constant(TypeSpec(TypeDesc::TypeString), {}, {}, {s});
+}
+
+void CodeGen::pushScope() {
+    m_scopes.emplace_back();
+    m_scopes.back().id = ++m_nextScopeId;
+}
+
+void CodeGen::popScope() {
+    m_scopes.pop_back();
+}
+
+std::string CodeGen::scopedName(const std::string& name) {
+    if (int(m_scopes.size()) - 1 == m_shaderScopeDepth) return name;
+    return "___" + std::to_string(m_scopes.back().id) + "_" + name;
+}
+
+void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
+    auto& vars = m_scopes.back().vars;
+    if (vars.count(name)) {
+        error(at, "'" + name + "' already declared in this scope");
+        return;
+    }
+    vars[name] = s;
+}
+
+Symbol* CodeGen::lookupVar(const std::string& name) {
+    for (auto it = m_scopes.rbegin(); it != m_scopes.rend(); ++it) {
+        auto f = it->vars.find(name);
+        if (f != it->vars.end()) return f->second;
+    }
+    return global(name);
+}
+
+Symbol* CodeGen::global(const std::string& name) {
+    static const std::map<std::string, TypeDesc> globals = {
+        {"P", TypeDesc::TypePoint},     {"I", TypeDesc::TypeVector},
+        {"N", TypeDesc::TypeNormal},    {"Ng", TypeDesc::TypeNormal},
+        {"u", TypeDesc::TypeFloat},     {"v", TypeDesc::TypeFloat},
+        {"dPdu", TypeDesc::TypeVector}, {"dPdv", TypeDesc::TypeVector},
+        {"Ps", TypeDesc::TypePoint},    {"time", TypeDesc::TypeFloat},
+        {"dtime", TypeDesc::TypeFloat}, {"dPdtime", TypeDesc::TypeVector},
+        {"Ci", TypeDesc::TypeColor}};
+    auto it = globals.find(name);
+    if (it == globals.end()) return nullptr;
+    auto g = m_globals.find(name);
+    if (g != m_globals.end()) return g->second;
+    bool saved = m_checkOnly;
+    m_checkOnly = false;
+    Symbol* s = newSymbol(name, name == "Ci" ? TypeSpec(it->second, true) : TypeSpec(it->second),
+                          SymTypeGlobal);
+    m_checkOnly = saved;
+    m_globals[name] = s;
+    return s;
+}
+
+int CodeGen::emit(const std::string& name, std::vector<Symbol*> args, std::string rw) {
+    Op op;
+    op.name = name;
+    if (rw.empty()) {
+        rw.assign(args.size(), 'r');
+        if (!args.empty()) rw[0] = 'w';
+    }
+    op.rw = rw;
+    op.args = std::move(args);
+    op.file = m_curFile;
+    op.line = m_curLine;
+    m_ops->push_back(std::move(op));
+    return int(m_ops->size()) - 1;
+}
+
+// ---------------------------------------------------------------- declarations
+
+void CodeGen::declareStruct(const Node* n) {
+    if (m_structs.count(n->name)) {
+        error(n, "struct type '" + n->name + "' already declared");
+        return;
+    }
+    auto* spec = new StructSpec(ustring(n->name), 0);
+    std::set<std::string> seen;
+    for (const auto& decl : n->kids) {
+        for (const auto& d : decl->kids) {
+            TypeName tn = d->typeName;
+            TypeSpec ft = resolveType(tn, d.get());
+            if (!d->kids.empty() && d->kids[0]->kind == NodeKind::IntLit)
+                ft.make_array(int(d->kids[0]->intValue));
+            if (seen.count(d->name)) {
+                error(d.get(),
+                      "Field \"" + d->name + "\" already exists in struct \"" + n->name + "\"");
+                continue;
+            }
+            seen.insert(d->name);
+            spec->add_field(ft, ustring(d->name));
+        }
+    }
+    int id = TypeSpec::new_struct(spec);
+    if (!id) {
+        error(n, "too many struct types");
+        return;
+    }
+    m_structs[n->name] = id;
+}
+
+void CodeGen::declareFunction(const Node* n) {
+    auto fn = std::make_unique<FunctionSymbol>();
+    fn->name = n->name;
+    fn->ret = resolveType(n->typeName, n);
+    fn->decl = n;
+    fn->file = fileOf(n);
+    fn->line = n->line;
+    fn->builtin = !n->body;
+    for (const auto& m : n->metadata) {
+        const Node* v = m->kid(0);
+        if (m->name == "op" && v && v->kind == NodeKind::StringLit) fn->opname = v->stringValue;
+        if (m->name == "builtin_closure") fn->isClosure = true;
+    }
+    for (const auto& p : n->kids) {
+        if (p->typeName.name == "...") {
+            fn->variadic = true;
+            continue;
+        }
+        FunctionSymbol::Param fp;
+        fp.type = resolveType(p->typeName, p.get());
+        fp.name = p->name;
+        fp.output = p->typeName.isOutput;
+        fn->params.push_back(fp);
+    }
+    m_functions[n->name].push_back(std::move(fn));
+}
+
+void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
+    const Node* n = fn->decl;
+    std::vector<Op> scratch;
+    auto* savedOps = m_ops;
+    m_ops = &scratch;
+    m_checkOnly = true;
+    pushScope();
+    for (size_t i = 0; i < fn->params.size(); ++i) {
+        Symbol* p = newStructSymbol(fn->params[i].name, fn->params[i].type, SymTypeParam);
+        if (fn->params[i].output) p->symtype = SymTypeOutputParam;
+        declare(fn->params[i].name, p, n);
+    }
+    m_currentFunction = fn;
+    m_sawReturn = false;
+    InlineFrame frame{fn, fn->ret.is_void() ? nullptr : temp(fn->ret), {}};
+    m_inline.push_back(frame);
+    pushScope();
+    for (const auto& s : n->body->kids) statement(s.get());
+    popScope();
+    m_inline.pop_back();
+    if (!fn->ret.is_void() && !m_sawReturn)
+        error(n->body.get(), "non-void function \"" + fn->name + "\" had no 'return' statement.");
+    m_currentFunction = nullptr;
+    popScope();
+    m_checkOnly = false;
+    m_ops = savedOps;
+}
+
+bool CodeGen::run(const std::vector<NodePtr>& decls, ShaderUnit& out) {
+    const Node* shader = nullptr;
+    m_scopes.emplace_back(); // global scope
+    for (const auto& d : decls) {
+        switch (d->kind) {
+        case NodeKind::StructDecl:
+            declareStruct(d.get());
+            break;
+        case NodeKind::FunctionDecl: {
+            declareFunction(d.get());
+            FunctionSymbol* fn = m_functions[d->name].back().get();
+            if (!fn->builtin && fileOf(d.get()) != "stdosl.h") checkFunctionBody(fn);
+            break;
+        }
+        case NodeKind::ShaderDecl:
+            if (shader) {
+                error(d.get(), "Only one shader is allowed per file.");
+                break;
+            }
+            shader = d.get();
+            break;
+        default:
+            break;
+        }
+    }
+    if (!shader) {
+        if (!m_diag.errorCount())
+            m_diag.error(m_files.empty() ? "" : m_files.back(), 1, "No shader function defined");
+        return false;
+    }
+    compileShader(shader, out);
+    return m_diag.errorCount() == 0;
+}
+
+bool CodeGen::constValue(const Node* e, const TypeSpec& t, std::vector<int>& iv,
+                         std::vector<float>& fv, std::vector<std::string>& sv) {
+    // Folds the literal forms a default may take: numbers, negated numbers, strings,
+    // constructors and init lists of those.
+    auto scalar = [&](const Node* n, double& out) -> bool {
+        bool neg = false;
+        while (n->kind == NodeKind::Unary && (n->op == "-" || n->op == "+")) {
+            if (n->op == "-") neg = !neg;
+            n = n->kid(0);
+        }
+        if (n->kind == NodeKind::IntLit)
+            out = double(n->intValue);
+        else if (n->kind == NodeKind::FloatLit)
+            out = n->floatValue;
+        else
+            return false;
+        if (neg) out = -out;
+        return true;
+    };
+    TypeSpec elem = t.elementtype();
+    if (t.is_array()) {
+        if (e->kind != NodeKind::InitList) {
+            // A single value fills one element (as for an unsized array).
+            return constValue(e, elem, iv, fv, sv);
+        }
+        for (const auto& k : e->kids)
+            if (!constValue(k.get(), elem, iv, fv, sv)) return false;
+        return true;
+    }
+    if (t.is_string()) {
+        if (e->kind != NodeKind::StringLit) return false;
+        sv.push_back(e->stringValue);
+        return true;
+    }
+    if (t.is_int()) {
+        double d;
+        if (!scalar(e, d) || e->kind == NodeKind::FloatLit) return false;
+        iv.push_back(int(d));
+        return true;
+    }
+    if (t.is_float()) {
+        double d;
+        if (!scalar(e, d)) return false;
+        fv.push_back(float(d));
+        return true;
+    }
+    if (t.is_triple() || t.is_matrix()) {
+        int n = t.is_matrix() ? 16 : 3;
+        double d;
+        if (scalar(e, d)) {
+            for (int i = 0; i < n; ++i)
+                fv.push_back(t.is_matrix() ? ((i % 5 == 0) ? float(d) : 0.0f) : float(d));
+            return true;
+        }
+        if (e->kind == NodeKind::TypeCtor && !e->isCast && !e->typeName.closure) {
+            std::vector<double> vals;
+            for (const auto& k : e->kids) {
+                if (!scalar(k.get(), d)) return false;
+                vals.push_back(d);
+            }
+            if (vals.size() == 1) {
+                for (int i = 0; i < n; ++i)
+                    fv.push_back(t.is_matrix() ? ((i % 5 == 0) ? float(vals[0]) : 0.0f)
+                                               : float(vals[0]));
+                return true;
+            }
+            if (int(vals.size()) != n) return false;
+            for (double x : vals) fv.push_back(float(x));
+            return true;
+        }
+        if (e->kind == NodeKind::InitList && int(e->kids.size()) == n) {
+            for (const auto& k : e->kids) {
+                if (!scalar(k.get(), d)) return false;
+                fv.push_back(float(d));
+            }
+            return true;
+        }
+    }
+    return false;
+}
+
+std::string formatFloat(float f) {
+    char buf[32];
+    std::snprintf(buf, sizeof buf, "%.9g", f);
+    return buf;
+}
+
+std::string quoteString(const std::string& s) {
+    std::string q = "\"";
+    for (char c : s) {
+        switch (c) {
+        case '\n':
+            q += "\\n";
+            break;
+        case '\t':
+            q += "\\t";
+            break;
+        case '\r':
+            q += "\\r";
+            break;
+        case '"':
+            q += "\\\"";
+            break;
+        case '\\':
+            q += "\\\\";
+            break;
+        default:
+            q += c;
+        }
+    }
+    return q + "\"";
+}
+
+std::string CodeGen::metaHint(const Node* m) {
+    TypeSpec t = resolveType(m->typeName, m);
+    std::vector<int> iv;
+    std::vector<float> fv;
+    std::vector<std::string> sv;
+    const Node* init = m->kid(0);
+    if (!init || !constValue(init, t, iv, fv, sv)) {
+        error(m, "metadata '" + m->name + "' must be a constant of type " + t.string());
+        return "";
+    }
+    if (t.is_unsized_array()) t.make_array(int(iv.size() + sv.size() + fv.size()));
+    std::string h = "%meta{" + t.string() + "," + m->name;
+    for (int i : iv) h += "," + std::to_string(i);
+    for (float f : fv) h += "," + formatFloat(f);
+    for (const auto& s : sv) h += "," + quoteString(s);
+    return h + "}";
+}
+
+void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
+    TypeSpec t = resolveType(p->typeName, p);
+    SymType st = p->typeName.isOutput ? SymTypeOutputParam : SymTypeParam;
+    Symbol* s = newStructSymbol(p->name, t, st);
+    for (const auto& m : p->metadata) s->metaHints.push_back(metaHint(m.get()));
+    declare(p->name, s, p);
+    const Node* init = p->kid(0);
+    auto fillZero = [&](Symbol* sym) {
+        int n = sym->type.numelements();
+        if (sym->type.is_unsized_array()) n = 0;
+        TypeSpec e = sym->type.elementtype();
+        if (e.is_int())
+            sym->ivals.assign(n, 0);
+        else if (e.is_string())
+            sym->svals.assign(n, "");
+        else if (e.is_triple())
+            sym->fvals.assign(3 * n, 0.f);
+        else if (e.is_matrix())
+            sym->fvals.assign(16 * n, 0.f);
+        else if (e.is_float())
+            sym->fvals.assign(n, 0.f);
+    };
+    std::vector<Symbol*> leaves;
+    std::function<void(Symbol*)> collect = [&](Symbol* x) {
+        if (x->fields.empty()) leaves.push_back(x);
+        for (auto* f : x->fields) collect(f);
+    };
+    collect(s);
+    if (!init) {
+        for (auto* l : leaves) fillZero(l);
+        return;
+    }
+    if (init->kind == NodeKind::InitList && init->kids.empty()) {
+        if (!t.is_unsized_array()) fillZero(s);
+        return;
+    }
+    if (!t.is_structure_based() && !t.is_closure_based()) {
+        std::vector<int> iv;
+        std::vector<float> fv;
+        std::vector<std::string> sv;
+        if (constValue(init, t, iv, fv, sv)) {
+            s->ivals = iv;
+            s->fvals = fv;
+            s->svals = sv;
+            if (t.is_unsized_array()) {
+                int n = int(iv.size() + sv.size() +
+                            fv.size() / (t.elementtype().is_triple()   ? 3
+                                         : t.elementtype().is_matrix() ? 16
+                                                                       : 1));
+                s->type.make_array(std::max(1, n));
+            } else if (t.is_array()) {
+                // Pad a short list with zeros so every element has a default.
+                TypeSpec e = t.elementtype();
+                int per = e.is_triple() ? 3 : e.is_matrix() ? 16 : 1;
+                if (e.is_int())
+                    s->ivals.resize(t.arraylength(), 0);
+                else if (e.is_string())
+                    s->svals.resize(t.arraylength());
+                else
+                    s->fvals.resize(size_t(t.arraylength()) * per, 0.f);
+            }
+            return;
+        }
+    }
+    // A default computed by code: its ops form a section named after the parameter.
+    for (auto* l : leaves) {
+        fillZero(l);
+        l->initexpr = true;
+    }
+    s->initBegin = nextOp();
+    m_curFile = p->file;
+    m_curLine = p->line;
+    initVariable(s, init, p, true);
+    int end = nextOp();
+    for (auto* l : leaves) {
+        l->initBegin = s->initBegin;
+        l->initEnd = end;
+    }
+    s->initEnd = end;
+}
+
+void CodeGen::compileShader(const Node* n, ShaderUnit& out) {
+    out.shaderType = n->op;
+    out.shaderName = n->name;
+    for (const auto& m : n->metadata) out.metaHints.push_back(metaHint(m.get()));
+    pushScope();
+    m_shaderScopeDepth = int(m_scopes.size()) - 1;
+    for (const auto& p : n->kids) shaderParam(p.get(), out);
+    out.mainBegin = nextOp();
+    for (const auto& s : n->body->kids) statement(s.get());
+    emit("end", {});
+    popScope();
+    out.ops = std::move(m_mainOps);
+    out.files = m_files;
+    // Parameters first (in declaration order), then globals, then everything else.
+    std::vector<Symbol*> params, globals, rest;
+    for (Symbol* s : m_symbols) {
+        if (s->symtype == SymTypeParam || s->symtype == SymTypeOutputParam)
+            params.push_back(s);
+        else if (s->symtype == SymTypeGlobal)
+            globals.push_back(s);
+        else
+            rest.push_back(s);
+    }
+    out.symbols = params;
+    out.symbols.insert(out.symbols.end(), globals.begin(), globals.end());
+    out.symbols.insert(out.symbols.end(), rest.begin(), rest.end());
+}
+
+// ---------------------------------------------------------------- statements
+
+void CodeGen::statement(const Node* s) {
+    if (!s) return;
+    m_curFile = s->file;
+    m_curLine = s->line;
+    switch (s->kind) {
+    case NodeKind::Block:
+        pushScope();
+        for (const auto& k : s->kids) statement(k.get());
+        popScope();
+        break;
+    case NodeKind::ExprStmt:
+        expr(s->kid(0));
+        break;
+    case NodeKind::VarDecl:
+        varDecl(s);
+        break;
+    case NodeKind::If:
+        ifStatement(s);
+        break;
+    case NodeKind::Loop:
+        loop(s);
+        break;
+    case NodeKind::Break:
+    case NodeKind::Continue:
+        if (m_loops.empty()) {
+            error(s, std::string("Cannot '") + (s->kind == NodeKind::Break ? "break" : "continue") +
+                         "' here -- not inside a loop.");
+            break;
+        }
+        emit(s->kind == NodeKind::Break ? "break" : "continue", {}, "");
+        break;
+    case NodeKind::Return:
+        returnStatement(s);
+        break;
+    case NodeKind::StructDecl:
+        declareStruct(s);
+        break;
+    default:
+        break;
+    }
+}
+
+void CodeGen::varDecl(const Node* d) {
+    for (const auto& v : d->kids) {
+        m_curLine = v->line;
+        TypeSpec t = resolveType(v->typeName, v.get());
+        const Node* lenExpr = v->kid(0);
+        const Node* init = v->kid(1);
+        if (lenExpr && lenExpr->kind == NodeKind::Empty) lenExpr = nullptr;
+        if (lenExpr) {
+            if (lenExpr->kind == NodeKind::IntLit) {
+                if (lenExpr->intValue < 1) {
+                    error(v.get(),
+                          "Invalid array length (" + std::to_string(lenExpr->intValue) + ")");
+                    error(v.get(), "Invalid array length for " + v->name);
+                    continue;
+                }
+                if (t.is_structure_based())
+                    t = TypeSpec(v->typeName.name.c_str(), t.structure(), int(lenExpr->intValue));
+                else
+                    t.make_array(int(lenExpr->intValue));
+            } else {
+                error(v.get(), "Array length must be a constant integer");
+                continue;
+            }
+        }
+        if (t.is_unsized_array()) {
+            int n = init && init->kind == NodeKind::InitList ? int(init->kids.size()) : 0;
+            if (n < 1) {
+                error(v.get(), "Invalid array length for " + v->name);
+                continue;
+            }
+            if (t.is_structure_based())
+                t = TypeSpec(v->typeName.name.c_str(), t.structure(), n);
+            else
+                t.make_array(n);
+        }
+        if (t.is_void()) {
+            error(v.get(), "variable '" + v->name + "' declared void");
+            continue;
+        }
+        if (m_structs.count(v->name)) {
+            error(v.get(), "type name '" + v->name + "' can't be used as a variable");
+        }
+        Symbol* s = newStructSymbol(scopedName(v->name), t, SymTypeLocal);
+        declare(v->name, s, v.get());
+        if (init) initVariable(s, init, v.get(), true);
+    }
+}
+
+void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool isDecl) {
+    const TypeSpec& t = var->type;
+    if (init->kind == NodeKind::InitList) {
+        if (init->kids.empty()) {
+            error(at, "Empty compound initializers '{ }' only allowed for shader parameters.");
+            return;
+        }
+        if (t.is_array()) {
+            if (int(init->kids.size()) > t.arraylength()) {
+                error(at, "Too many initializers for a '" + t.string() + "'");
+                return;
+            }
+            TypeSpec elem = t.elementtype();
+            for (size_t i = 0; i < init->kids.size(); ++i) {
+                const Node* k = init->kid(i);
+                Symbol* val = k->kind == NodeKind::InitList ? initList(k, elem) : expr(k, &elem);
+                LRef r;
+                r.sym = var;
+                r.index = constInt(int(i));
+                r.type = elem;
+                store(r, val, k);
+            }
+            return;
+        }
+        if (t.is_structure()) {
+            StructSpec* spec = t.structspec();
+            if (int(init->kids.size()) > spec->numfields()) {
+                error(at, "Too many initializers for struct '" + spec->name().string() + "'");
+                return;
+            }
+            for (size_t i = 0; i < init->kids.size(); ++i) {
+                const Node* k = init->kid(i);
+                TypeSpec ft = spec->field(int(i)).type;
+                Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
+                Symbol* f = var->fields[i];
+                if (!assignable(ft, val->type) && !(ft.is_closure() && val->isConst())) {
+                    error(k, "Can't assign '" + val->type.string() + "' to '" + ft.string() + " " +
+                                 spec->name().string() + "." + spec->field(int(i)).name.string() +
+                                 "'");
+                    continue;
+                }
+                assignInto(f, val, k);
+            }
+            return;
+        }
+        Symbol* val = initList(init, t);
+        assignInto(var, val, at);
+        return;
+    }
+    Symbol* val = expr(init, &t);
+    if (!val) return;
+    if (t.is_structure_based() || val->type.is_structure_based()) {
+        if (!(t == val->type) && !equivalent(t, val->type)) {
+            error(at, std::string(isDecl ? "Cannot initialize " : "Cannot assign ") + t.string() +
+                          " " + at->name + " = " + val->type.string());
+            return;
+        }
+    } else if (t.is_closure_based() || val->type.is_closure_based()) {
+        bool zero =
+            val->isConst() && val->type.is_int() && !val->ivals.empty() && val->ivals[0] == 0;
+        if (!(t.is_closure_based() && (val->type.is_closure_based() || zero))) {
+            error(at, std::string(isDecl ? "Cannot initialize " : "Cannot assign ") + t.string() +
+                          " " + at->name + " = " + val->type.string());
+            return;
+        }
+    } else if (t.is_int() && val->type.is_float()) {
+        warning(at, "Assignment may lose precision: " + t.string() + " " + at->name + " = " +
+                        val->type.string());
+    } else if (!assignable(t, val->type) && !(t.is_int() && val->type.is_float())) {
+        if (!(t.is_array() && val->type.is_array() &&
+              equivalent(t.elementtype(), val->type.elementtype()))) {
+            error(at, std::string(isDecl ? "Cannot initialize " : "Cannot assign ") + t.string() +
+                          " " + at->name + " = " + val->type.string());
+            return;
+        }
+    }
+    assignInto(var, val, at);
+}
+
+void CodeGen::ifStatement(const Node* s) {
+    Symbol* cond = expr(s->kid(0));
+    if (cond->type.is_structure_based() || cond->type.is_closure_based())
+        error(s, "Cannot use a " + cond->type.string() + " as a condition");
+    m_curLine = s->line;
+    m_curFile = s->file;
+    if (!cond->type.is_int()) {
+        Symbol* t = temp(TypeSpec(TypeDesc::TypeInt));
+        emit("neq", {t, cond, constInt(0)});
+        cond = t;
+    }
+    int ifop = emit("if", {cond}, "r");
+    statement(s->kid(1));
+    int elseStart = nextOp();
+    statement(s->kid(2));
+    (*m_ops)[ifop].jumps = {elseStart, nextOp()};
+}
+
+void CodeGen::loop(const Node* s) {
+    pushScope();
+    const char* opname = s->loop == LoopKind::For     ? "for"
+                         : s->loop == LoopKind::While ? "while"
+                                                      : "dowhile";
+    int loopop = emit(opname, {nullptr}, "r");
+    statement(s->kid(0));
+    int condStart = nextOp();
+    Symbol* cond = nullptr;
+    const Node* c = s->kid(1);
+    if (c && c->kind != NodeKind::Empty) {
+        cond = expr(c);
+        m_curLine = s->line;
+        m_curFile = s->file;
+        if (cond->type.is_structure_based() || cond->type.is_closure_based())
+            error(s, "Cannot use a " + cond->type.string() + " as a condition");
+        Symbol* t = temp(TypeSpec(TypeDesc::TypeInt));
+        emit("neq", {t, cond, constInt(0)});
+        cond = t;
+    } else {
+        cond = constInt(1);
+    }
+    int bodyStart = nextOp();
+    m_loops.push_back({});
+    statement(s->kid(3));
+    m_loops.pop_back();
+    int stepStart = nextOp();
+    const Node* step = s->kid(2);
+    if (step && step->kind != NodeKind::Empty) {
+        m_curLine = step->line;
+        expr(step);
+    }
+    int end = nextOp();
+    Op& op = (*m_ops)[loopop];
+    op.args[0] = cond;
+    op.jumps = {condStart, bodyStart, stepStart, end};
+    popScope();
+}
+
+void CodeGen::returnStatement(const Node* s) {
+    if (m_inline.empty()) {
+        // `return` in the shader body ends the shader.
+        if (s->kid(0)) error(s, "Cannot return a value from a shader");
+        emit("exit", {}, "");
+        return;
+    }
+    InlineFrame& f = m_inline.back();
+    m_sawReturn = true;
+    if (s->kid(0)) {
+        if (!f.result) {
+            error(s, "Cannot return a value from a void function");
+            return;
+        }
+        Symbol* v = expr(s->kid(0), &f.fn->ret);
+        if (!assignable(f.fn->ret, v->type) && !equivalent(f.fn->ret, v->type)) {
+            error(s, "Cannot return a '" + v->type.string() + "' from '" + f.fn->ret.string() +
+                         " " + f.fn->name + "()'");
+            return;
+        }
+        assignInto(f.result, v, s);
+    } else if (f.result) {
+        error(s, "You must return a '" + f.fn->ret.string() + "' from '" + f.fn->name + "()'");
+    }
+    f.returnOps.push_back(emit("return", {}, ""));
+}
+
+} // namespace OSL::pvt

@@ -1,0 +1,996 @@
+// Expressions: type rules, implicit conversions, l-values (array elements, components, matrix
+// cells, struct fields), calls with overload resolution, and inlining of user functions.
+#include "codegen.h"
+
+#include <algorithm>
+#include <functional>
+
+namespace OSL::pvt {
+
+namespace {
+const TypeSpec kInt(TypeDesc::TypeInt);
+const TypeSpec kFloat(TypeDesc::TypeFloat);
+const TypeSpec kString(TypeDesc::TypeString);
+
+bool isZeroConst(const Symbol* s) {
+    return s->isConst() && ((s->type.is_int() && !s->ivals.empty() && s->ivals[0] == 0) ||
+                            (s->type.is_float() && !s->fvals.empty() && s->fvals[0] == 0.f));
+}
+
+int componentIndex(const TypeSpec& t, const std::string& name) {
+    static const char* const xyz[] = {"x", "y", "z"};
+    static const char* const rgb[] = {"r", "g", "b"};
+    for (int i = 0; i < 3; ++i)
+        if (name == (t.is_color() ? rgb[i] : xyz[i])) return i;
+    return -1;
+}
+} // namespace
+
+Symbol* CodeGen::expr(const Node* e, const TypeSpec* expected) {
+    if (!e) return temp(kFloat);
+    if (e->kind != NodeKind::Empty) m_curLine = e->line, m_curFile = e->file;
+    Symbol* r = nullptr;
+    switch (e->kind) {
+    case NodeKind::IntLit:
+        r = constInt(int(e->intValue));
+        break;
+    case NodeKind::FloatLit:
+        r = constFloat(float(e->floatValue));
+        break;
+    case NodeKind::StringLit:
+        r = constString(e->stringValue);
+        break;
+    case NodeKind::VarRef: {
+        r = lookupVar(e->name);
+        if (!r) {
+            if (m_structs.count(e->name))
+                error(e, "type name '" + e->name + "' can't be used as a variable");
+            else if (m_functions.count(e->name))
+                error(e, "function '" + e->name + "' can't be used as a variable");
+            else
+                error(e, "'" + e->name + "' was not declared in this scope");
+            r = temp(TypeSpec());
+        }
+        break;
+    }
+    case NodeKind::Index:
+    case NodeKind::Field:
+        r = load(lvalue(e, false), e);
+        break;
+    case NodeKind::Unary:
+        r = unary(e);
+        break;
+    case NodeKind::PreIncDec:
+    case NodeKind::PostIncDec:
+        r = incdec(e);
+        break;
+    case NodeKind::Binary:
+        r = (e->op == "&&" || e->op == "||") ? logical(e) : binary(e);
+        break;
+    case NodeKind::Ternary:
+        r = ternary(e);
+        break;
+    case NodeKind::Assign:
+        r = assign(e);
+        break;
+    case NodeKind::Call:
+        r = call(e, expected);
+        break;
+    case NodeKind::TypeCtor:
+        r = typeCtor(e);
+        break;
+    case NodeKind::InitList:
+        if (expected) {
+            r = initList(e, *expected);
+        } else {
+            error(e, "Cannot use an initializer list here");
+            r = temp(kFloat);
+        }
+        break;
+    case NodeKind::Comma:
+        if (e->parenthesized)
+            warning(e, "Comma operator inside parenthesis is probably an error -- it is not a "
+                       "vector/color.");
+        for (const auto& k : e->kids) r = expr(k.get());
+        break;
+    default:
+        r = temp(kFloat);
+        break;
+    }
+    const_cast<Node*>(e)->type = r->type;
+    return r;
+}
+
+Symbol* CodeGen::convert(Symbol* v, const TypeSpec& to, const Node* at) {
+    const TypeSpec& from = v->type;
+    if (from == to || to.is_structure_based() || to.is_closure_based() || from.is_closure_based() ||
+        to.is_unknown() || from.is_unknown())
+        return v;
+    if (to.is_array() || from.is_array()) return v;
+    if (equivalent(to, from)) return v;
+    if (v->isConst() && from.is_scalarnum() && (to.is_float() || to.is_triple() || to.is_int())) {
+        float f = from.is_int() ? float(v->ivals[0]) : v->fvals[0];
+        if (to.is_float()) return constFloat(f);
+        if (to.is_int()) return constInt(int(f));
+        return constant(to, {}, {f, f, f}, {});
+    }
+    if (!assignable(to, from) && !(to.is_int() && from.is_float())) return v;
+    Symbol* t = temp(to);
+    (void)at;
+    emit("assign", {t, v});
+    return t;
+}
+
+void CodeGen::assignInto(Symbol* dst, Symbol* src, const Node* at) {
+    if (dst->type.is_structure_based()) {
+        if (!equivalent(dst->type, src->type) || dst->fields.size() != src->fields.size()) return;
+        for (size_t i = 0; i < dst->fields.size(); ++i)
+            assignInto(dst->fields[i], src->fields[i], at);
+        return;
+    }
+    if (dst->type.is_array() && src->type.is_array()) {
+        emit("arraycopy", {dst, src});
+        return;
+    }
+    emit("assign", {dst, src});
+}
+
+void CodeGen::checkWritable(Symbol* s, const Node* at, const std::string& context) {
+    Symbol* root = s;
+    while (root->structParent) root = root->structParent;
+    bool funcParam = root->symtype == SymTypeParam && m_currentFunction;
+    bool global = root->symtype == SymTypeGlobal && m_nonWritableGlobals.count(root->name);
+    if (funcParam || global)
+        error(at, "cannot write to non-output parameter \"" + root->name + "\"" + context);
+    if (root->isConst()) error(at, "cannot write to a constant");
+}
+
+CodeGen::LRef CodeGen::lvalue(const Node* e, bool forWrite) {
+    LRef r;
+    if (e->kind == NodeKind::VarRef) {
+        Symbol* s = lookupVar(e->name);
+        if (!s) {
+            expr(e); // reports the problem
+            s = temp(TypeSpec());
+        }
+        r.sym = s;
+        r.type = s->type;
+        return r;
+    }
+    if (e->kind == NodeKind::Field) {
+        LRef b = lvalue(e->kid(0), forWrite);
+        if (b.type.is_structure_based() && !b.comp) {
+            StructSpec* spec = b.type.structspec();
+            int k = spec ? spec->lookup_field(ustring(e->name)) : -1;
+            if (k < 0 || size_t(k) >= b.sym->fields.size()) {
+                error(e, "struct type '" + (spec ? spec->name().string() : std::string("?")) +
+                             "' does not have a member '" + e->name + "'");
+                r.sym = temp(kFloat);
+                r.type = kFloat;
+                return r;
+            }
+            r.sym = b.sym->fields[k];
+            r.index = b.index;
+            r.type = spec->field(k).type;
+            if (b.index && r.type.is_structure_based())
+                r.type = TypeSpec(r.type.structspec()->name().c_str(), r.type.structure());
+            return r;
+        }
+        if (b.type.is_triple() && !b.comp) {
+            int k = componentIndex(b.type, e->name);
+            if (k < 0) {
+                error(e, "type '" + b.type.string() + "' does not have a member '" + e->name + "'");
+                k = 0;
+            }
+            r = b;
+            r.comp = constInt(k);
+            r.type = kFloat;
+            return r;
+        }
+        error(e, "type '" + b.type.string() + "' does not have a member '" + e->name + "'");
+        r.sym = temp(kFloat);
+        r.type = kFloat;
+        return r;
+    }
+    if (e->kind == NodeKind::Index) {
+        LRef b = lvalue(e->kid(0), forWrite);
+        Symbol* idx = expr(e->kid(1));
+        if (!idx->type.is_int() && !idx->type.is_unknown())
+            error(e, "array index must be an integer");
+        m_curLine = e->line;
+        if (b.type.is_array() && !b.index && !b.comp) {
+            r = b;
+            r.index = idx;
+            r.type = b.type.elementtype();
+            if (r.type.is_structure_based())
+                r.type = TypeSpec(r.type.structspec()->name().c_str(), r.type.structure());
+            return r;
+        }
+        if (b.type.is_triple() && !b.comp) {
+            r = b;
+            r.comp = idx;
+            r.type = kFloat;
+            return r;
+        }
+        if (b.type.is_matrix() && !b.comp) {
+            r = b;
+            r.comp = idx;
+            r.type = TypeSpec(); // a matrix row: only usable with a second index
+            return r;
+        }
+        if (b.sym && b.sym->type.is_matrix() && b.comp && !b.comp2 && b.type.is_unknown()) {
+            r = b;
+            r.comp2 = idx;
+            r.type = kFloat;
+            return r;
+        }
+        error(e, "indexing into non-array or non-component type");
+        r.sym = temp(kFloat);
+        r.type = kFloat;
+        return r;
+    }
+    // Any other expression: an r-value held in a temporary.
+    Symbol* v = expr(e);
+    if (forWrite) error(e, "Cannot assign to an expression that is not a variable");
+    r.sym = v;
+    r.type = v->type;
+    return r;
+}
+
+Symbol* CodeGen::load(const LRef& r, const Node* at) {
+    if (!r.sym) return temp(kFloat);
+    if (r.sym->type.is_matrix() && r.comp && !r.comp2) {
+        error(at, "indexing into non-array or non-component type");
+        return temp(kFloat);
+    }
+    Symbol* base = r.sym;
+    if (r.index) {
+        TypeSpec et = r.sym->type.elementtype();
+        if (r.sym->type.is_structure_based()) {
+            Symbol* t = temp(TypeSpec(et.structspec()->name().c_str(), et.structure()));
+            std::function<void(Symbol*, Symbol*)> copy = [&](Symbol* dst, Symbol* src) {
+                if (dst->fields.empty()) {
+                    emit("aref", {dst, src, r.index});
+                    return;
+                }
+                for (size_t i = 0; i < dst->fields.size() && i < src->fields.size(); ++i)
+                    copy(dst->fields[i], src->fields[i]);
+            };
+            copy(t, r.sym);
+            base = t;
+        } else {
+            Symbol* t = temp(et);
+            emit("aref", {t, r.sym, r.index});
+            base = t;
+        }
+    }
+    if (r.comp2) {
+        Symbol* t = temp(kFloat);
+        emit("mxcompref", {t, base, r.comp, r.comp2});
+        return t;
+    }
+    if (r.comp) {
+        Symbol* t = temp(kFloat);
+        emit("compref", {t, base, r.comp});
+        return t;
+    }
+    return base;
+}
+
+void CodeGen::store(const LRef& r, Symbol* value, const Node* at) {
+    if (!r.sym) return;
+    checkWritable(r.sym, at);
+    if (r.sym->type.is_matrix() && r.comp && !r.comp2) {
+        error(at, "indexing into non-array or non-component type");
+        return;
+    }
+    if (!r.index && !r.comp) {
+        assignInto(r.sym, value, at);
+        return;
+    }
+    if (r.comp && !r.comp2 && !r.index) {
+        emit("compassign", {r.sym, r.comp, convert(value, kFloat, at)});
+        return;
+    }
+    if (r.comp2 && !r.index) {
+        emit("mxcompassign", {r.sym, r.comp, r.comp2, convert(value, kFloat, at)});
+        return;
+    }
+    // An array element, possibly one component of it.
+    TypeSpec et = r.sym->type.elementtype();
+    if (r.sym->type.is_structure_based()) {
+        std::function<void(Symbol*, Symbol*)> copy = [&](Symbol* dst, Symbol* src) {
+            if (dst->fields.empty()) {
+                emit("aassign", {dst, r.index, src});
+                return;
+            }
+            for (size_t i = 0; i < dst->fields.size() && i < src->fields.size(); ++i)
+                copy(dst->fields[i], src->fields[i]);
+        };
+        copy(r.sym, value);
+        return;
+    }
+    if (!r.comp) {
+        emit("aassign", {r.sym, r.index, convert(value, et, at)});
+        return;
+    }
+    Symbol* elem = temp(et);
+    emit("aref", {elem, r.sym, r.index});
+    if (r.comp2)
+        emit("mxcompassign", {elem, r.comp, r.comp2, convert(value, kFloat, at)});
+    else
+        emit("compassign", {elem, r.comp, convert(value, kFloat, at)});
+    emit("aassign", {r.sym, r.index, elem});
+}
+
+static TypeSpec arithmeticResult(const std::string& op, const TypeSpec& a, const TypeSpec& b,
+                                 bool& ok) {
+    ok = true;
+    if (a.is_unknown() || b.is_unknown()) return TypeSpec();
+    bool cmp = op == "==" || op == "!=" || op == "<" || op == ">" || op == "<=" || op == ">=";
+    if (a.is_structure_based() || b.is_structure_based() || a.is_array() || b.is_array()) {
+        ok = false;
+        return kFloat;
+    }
+    if (a.is_closure() || b.is_closure()) {
+        if (op == "+" && a.is_closure() && b.is_closure()) return a;
+        if (op == "*" && (a.is_closure() != b.is_closure())) {
+            const TypeSpec& o = a.is_closure() ? b : a;
+            if (o.is_float() || o.is_int() || o.is_color()) return a.is_closure() ? a : b;
+        }
+        ok = false;
+        return kFloat;
+    }
+    if (a.is_string() || b.is_string()) {
+        if ((op == "==" || op == "!=") && a.is_string() && b.is_string()) return kInt;
+        ok = false;
+        return kFloat;
+    }
+    if (cmp) {
+        if ((op == "==" || op == "!=") || (a.is_scalarnum() && b.is_scalarnum())) return kInt;
+        ok = false;
+        return kInt;
+    }
+    if (op == "&" || op == "|" || op == "^" || op == "<<" || op == ">>") {
+        ok = a.is_int() && b.is_int();
+        return kInt;
+    }
+    if (a.is_matrix() || b.is_matrix()) {
+        if ((op == "*" || op == "/") && (a.is_matrix() || a.is_scalarnum()) &&
+            (b.is_matrix() || b.is_scalarnum()))
+            return TypeSpec(TypeDesc::TypeMatrix);
+        if ((op == "+" || op == "-") && (a.is_matrix() || a.is_scalarnum()) &&
+            (b.is_matrix() || b.is_scalarnum()))
+            return TypeSpec(TypeDesc::TypeMatrix);
+        ok = false;
+        return TypeSpec(TypeDesc::TypeMatrix);
+    }
+    if (a.is_triple() && b.is_triple()) {
+        if (op == "-" && a.is_point() && b.is_point()) return TypeSpec(TypeDesc::TypeVector);
+        return a;
+    }
+    if (a.is_triple()) return a;
+    if (b.is_triple()) return b;
+    if (a.is_int() && b.is_int()) return kInt;
+    return kFloat;
+}
+
+Symbol* CodeGen::binary(const Node* e) {
+    Symbol* a = expr(e->kid(0));
+    Symbol* b = expr(e->kid(1));
+    m_curLine = e->line;
+    m_curFile = e->file;
+    bool ok = true;
+    TypeSpec rt = arithmeticResult(e->op, a->type, b->type, ok);
+    if (!ok) {
+        error(e, "Don't know how to compute " + a->type.string() + " " + e->op + " " +
+                     b->type.string());
+        return temp(rt);
+    }
+    static const std::map<std::string, std::string> names = {
+        {"+", "add"},   {"-", "sub"}, {"*", "mul"},  {"/", "div"}, {"%", "mod"}, {"==", "eq"},
+        {"!=", "neq"},  {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
+        {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
+    // Integers meet floats as floats.
+    bool floaty =
+        rt.is_float_based() || (!rt.is_int() && !rt.is_closure_based()) ||
+        ((a->type.is_float() || b->type.is_float() || a->type.is_triple() || b->type.is_triple()) &&
+         !(a->type.is_int() && b->type.is_int()));
+    if (floaty && !(rt.is_int() && a->type.is_int() && b->type.is_int())) {
+        if (a->type.is_int() && !b->type.is_int()) a = convert(a, kFloat, e);
+        if (b->type.is_int() && !a->type.is_int()) b = convert(b, kFloat, e);
+    }
+    Symbol* r = temp(rt);
+    emit(names.at(e->op), {r, a, b});
+    return r;
+}
+
+Symbol* CodeGen::logical(const Node* e) {
+    Symbol* r = temp(kInt);
+    Symbol* a = expr(e->kid(0));
+    m_curLine = e->line;
+    emit("neq", {r, a, isZeroConst(a) && a->type.is_float() ? constFloat(0) : constInt(0)});
+    int ifop = emit("if", {r}, "r");
+    int elseStart;
+    if (e->op == "&&") {
+        Symbol* b = expr(e->kid(1));
+        Symbol* t = temp(kInt);
+        emit("neq", {t, b, constInt(0)});
+        emit("assign", {r, t});
+        elseStart = nextOp();
+    } else {
+        elseStart = nextOp();
+        Symbol* b = expr(e->kid(1));
+        Symbol* t = temp(kInt);
+        emit("neq", {t, b, constInt(0)});
+        emit("assign", {r, t});
+    }
+    (*m_ops)[ifop].jumps = {elseStart, nextOp()};
+    return r;
+}
+
+Symbol* CodeGen::unary(const Node* e) {
+    const Node* k = e->kid(0);
+    if (e->op == "-" && (k->kind == NodeKind::IntLit || k->kind == NodeKind::FloatLit)) {
+        return k->kind == NodeKind::IntLit ? constInt(-int(k->intValue))
+                                           : constFloat(-float(k->floatValue));
+    }
+    Symbol* a = expr(k);
+    m_curLine = e->line;
+    if (e->op == "+") return a;
+    if (a->type.is_structure_based() || a->type.is_array() || a->type.is_string()) {
+        error(e, "Can't do '" + e->op + "' to a " + a->type.string());
+        return temp(a->type);
+    }
+    if (e->op == "-") {
+        Symbol* r = temp(a->type);
+        emit("neg", {r, a});
+        return r;
+    }
+    if (e->op == "~") {
+        if (!a->type.is_int()) error(e, "Operator '~' can only be done to an int");
+        Symbol* r = temp(kInt);
+        emit("compl", {r, a});
+        return r;
+    }
+    Symbol* r = temp(kInt);
+    emit("eq", {r, a, constInt(0)});
+    return r;
+}
+
+Symbol* CodeGen::incdec(const Node* e) {
+    LRef r = lvalue(e->kid(0), true);
+    Symbol* cur = load(r, e);
+    if (!cur->type.is_int() && !cur->type.is_float()) {
+        error(e, e->op + " can only be applied to an int or float");
+        return cur;
+    }
+    Symbol* one = cur->type.is_int() ? constInt(1) : constFloat(1);
+    Symbol* old = nullptr;
+    if (e->kind == NodeKind::PostIncDec) {
+        old = temp(cur->type);
+        emit("assign", {old, cur});
+    }
+    Symbol* nv = (!r.index && !r.comp) ? r.sym : temp(cur->type);
+    if (!r.index && !r.comp) checkWritable(r.sym, e);
+    emit(e->op == "++" ? "add" : "sub", {nv, cur, one});
+    if (r.index || r.comp) store(r, nv, e);
+    return old ? old : nv;
+}
+
+Symbol* CodeGen::assign(const Node* e) {
+    LRef r = lvalue(e->kid(0), true);
+    const Node* rhs = e->kid(1);
+    m_curLine = e->line;
+    if (e->op == "=") {
+        if (rhs->kind == NodeKind::InitList) {
+            Symbol* v = initList(rhs, r.type);
+            store(r, v, e);
+            return v;
+        }
+        Symbol* v = expr(rhs, &r.type);
+        m_curLine = e->line;
+        const TypeSpec& t = r.type;
+        std::string lhsName = e->kid(0)->kind == NodeKind::VarRef ? e->kid(0)->name : "";
+        if (t.is_structure_based() || v->type.is_structure_based()) {
+            if (!equivalent(t, v->type)) {
+                error(e, "Cannot assign " + t.string() + " " + lhsName + " = " + v->type.string());
+                return v;
+            }
+        } else if (t.is_closure_based() || v->type.is_closure_based()) {
+            bool zero = v->isConst() && v->type.is_int() && !v->ivals.empty() && v->ivals[0] == 0;
+            if (!(t.is_closure_based() && (v->type.is_closure_based() || zero))) {
+                error(e, "Cannot assign " + t.string() + " " + lhsName + " = " + v->type.string());
+                return v;
+            }
+        } else if (t.is_int() && v->type.is_float()) {
+            warning(e, "Assignment may lose precision: " + t.string() + " " + lhsName + " = " +
+                           v->type.string());
+        } else if (!t.is_unknown() && !v->type.is_unknown() && !assignable(t, v->type) &&
+                   !(t.is_array() && v->type.is_array() &&
+                     equivalent(t.elementtype(), v->type.elementtype()))) {
+            error(e, "Cannot assign " + t.string() + " " + lhsName + " = " + v->type.string());
+            return v;
+        }
+        store(r, v, e);
+        return v;
+    }
+    Symbol* cur = load(r, e);
+    Symbol* v = expr(rhs);
+    m_curLine = e->line;
+    std::string op = e->op.substr(0, e->op.size() - 1);
+    bool ok = true;
+    TypeSpec rt = arithmeticResult(op, cur->type, v->type, ok);
+    if (!ok) {
+        error(e, "Don't know how to compute " + cur->type.string() + " " + op + " " +
+                     v->type.string());
+        return cur;
+    }
+    static const std::map<std::string, std::string> names = {
+        {"+", "add"},    {"-", "sub"},   {"*", "mul"}, {"/", "div"},  {"%", "mod"},
+        {"&", "bitand"}, {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
+    if (v->type.is_int() && !cur->type.is_int()) v = convert(v, kFloat, e);
+    bool direct = !r.index && !r.comp && equivalent(rt, cur->type);
+    Symbol* dst = direct ? r.sym : temp(rt);
+    if (direct) checkWritable(r.sym, e);
+    emit(names.at(op), {dst, cur, v});
+    if (!direct) store(r, dst, e);
+    return dst;
+}
+
+Symbol* CodeGen::ternary(const Node* e) {
+    Symbol* c = expr(e->kid(0));
+    m_curLine = e->line;
+    if (!c->type.is_int()) {
+        Symbol* t = temp(kInt);
+        emit("neq", {t, c, constInt(0)});
+        c = t;
+    }
+    int ifop = emit("if", {c}, "r");
+    // The result type comes from the branches; generate them into scratch to learn it first.
+    Symbol* a = expr(e->kid(1));
+    Symbol* r = temp(a->type);
+    assignInto(r, a, e);
+    int elseStart = nextOp();
+    Symbol* b = expr(e->kid(2), &a->type);
+    if (!assignable(r->type, b->type) && !equivalent(r->type, b->type))
+        error(e, "Incompatible types in ?: expression: " + a->type.string() + " and " +
+                     b->type.string());
+    assignInto(r, b, e);
+    (*m_ops)[ifop].jumps = {elseStart, nextOp()};
+    return r;
+}
+
+Symbol* CodeGen::typeCtor(const Node* e) {
+    TypeSpec t = resolveType(e->typeName, e);
+    std::vector<Symbol*> args;
+    for (const auto& k : e->kids) args.push_back(expr(k.get()));
+    m_curLine = e->line;
+    if (t.is_closure_based() || t.is_structure_based() || t.is_void()) {
+        error(e, "Cannot construct a " + t.string());
+        return temp(t);
+    }
+    if (args.size() == 1 && !args[0]->type.is_string()) {
+        const TypeSpec& from = args[0]->type;
+        if (from.is_structure_based() || from.is_closure_based() || from.is_array() ||
+            (from.is_string() != t.is_string()) || (t.is_scalarnum() && !from.is_scalarnum()) ||
+            (t.is_triple() && from.is_matrix()) ||
+            (t.is_matrix() && !from.is_scalarnum() && !from.is_matrix())) {
+            error(e, "Cannot construct " + t.string() + " from " + from.string());
+            return temp(t);
+        }
+        Symbol* r = temp(t);
+        emit("assign", {r, args[0]});
+        return r;
+    }
+    bool ok = false;
+    size_t first = (!args.empty() && args[0]->type.is_string()) ? 1 : 0;
+    size_t nums = args.size() - first;
+    if (t.is_triple()) ok = nums == 3 || (first && nums == 1);
+    if (t.is_matrix())
+        ok = nums == 16 || (first && nums == 1) || (first && nums == 16) ||
+             (first && args.size() == 2 && args[1]->type.is_string());
+    for (size_t i = first; i < args.size() && ok; ++i)
+        if (!(args[i]->type.is_scalarnum() || (t.is_matrix() && args[i]->type.is_string()) ||
+              (nums == 1 && (args[i]->type.is_triple() || args[i]->type.is_matrix()))))
+            ok = false;
+    if (!ok) {
+        std::string sig;
+        for (size_t i = 0; i < args.size(); ++i) sig += (i ? ", " : "") + args[i]->type.string();
+        error(e, "No matching function call to '" + t.string() + " (" + sig + ")'");
+        return temp(t);
+    }
+    for (size_t i = first; i < args.size(); ++i)
+        if (args[i]->type.is_int()) args[i] = convert(args[i], kFloat, e);
+    Symbol* r = temp(t);
+    args.insert(args.begin(), r);
+    emit(t.string(), args);
+    return r;
+}
+
+Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
+    if (t.is_array()) {
+        TypeSpec elem = t.elementtype();
+        if (t.is_sized_array() && int(e->kids.size()) > t.arraylength()) {
+            error(e, "Too many initializers for a '" + t.string() + "'");
+            return temp(t);
+        }
+        TypeSpec at = t;
+        if (t.is_unsized_array()) at.make_array(int(std::max<size_t>(1, e->kids.size())));
+        Symbol* r = temp(at);
+        for (size_t i = 0; i < e->kids.size(); ++i) {
+            const Node* k = e->kid(i);
+            Symbol* v = k->kind == NodeKind::InitList ? initList(k, elem) : expr(k, &elem);
+            emit("aassign", {r, constInt(int(i)), convert(v, elem, k)});
+        }
+        return r;
+    }
+    if (t.is_structure()) {
+        StructSpec* spec = t.structspec();
+        if (int(e->kids.size()) > spec->numfields()) {
+            error(e, "Too many initializers for struct '" + spec->name().string() + "'");
+            return temp(t);
+        }
+        Symbol* r = temp(t);
+        for (size_t i = 0; i < e->kids.size(); ++i) {
+            const Node* k = e->kid(i);
+            TypeSpec ft = spec->field(int(i)).type;
+            Symbol* v = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
+            if (!assignable(ft, v->type) && !equivalent(ft, v->type)) {
+                error(k, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " +
+                             spec->name().string() + "." + spec->field(int(i)).name.string() + "'");
+                continue;
+            }
+            assignInto(r->fields[i], v, k);
+        }
+        return r;
+    }
+    if (t.is_triple() || t.is_matrix()) {
+        // `{a, b, c}` for a triple reads as its constructor.
+        std::vector<Symbol*> args;
+        for (const auto& k : e->kids) args.push_back(convert(expr(k.get()), kFloat, k.get()));
+        size_t want = t.is_matrix() ? 16 : 3;
+        Symbol* r = temp(t);
+        if (args.size() == 1) {
+            emit("assign", {r, args[0]});
+        } else if (args.size() == want) {
+            args.insert(args.begin(), r);
+            emit(t.string(), args);
+        } else {
+            error(e, "Too many initializers for a '" + t.string() + "'");
+        }
+        return r;
+    }
+    if (e->kids.size() == 1) return expr(e->kid(0), &t);
+    error(e, "Too many initializers for a '" + t.string() + "'");
+    return temp(t);
+}
+
+// ---------------------------------------------------------------- calls
+
+static int conversionCost(const TypeSpec& arg, const TypeSpec& param, bool output) {
+    if (arg == param) return 0;
+    if (param.is_unsized_array() && arg.is_array()) {
+        TypeSpec a = arg.elementtype(), p = param.elementtype();
+        return (a == p || equivalent(a, p)) ? 0 : -1;
+    }
+    if (arg.is_array() || param.is_array()) return equivalent(arg, param) ? 0 : -1;
+    if (arg.is_structure_based() || param.is_structure_based())
+        return equivalent(arg, param) ? 0 : -1;
+    if (arg.is_closure_based() || param.is_closure_based())
+        return (arg.is_closure_based() && param.is_closure_based()) ? 0 : -1;
+    if (arg.is_triple() && param.is_triple()) return output ? -1 : 1;
+    if (output) return -1;
+    if (arg.is_int() && param.is_float()) return 2;
+    if (arg.is_float() && param.is_triple()) return 3;
+    if (arg.is_int() && param.is_triple()) return 4;
+    return -1;
+}
+
+static int returnRank(const TypeSpec& t) {
+    if (t.is_float()) return 0;
+    if (t.is_int()) return 1;
+    if (t.is_color()) return 2;
+    if (t.is_vector()) return 3;
+    if (t.is_point()) return 4;
+    if (t.is_normal()) return 5;
+    if (t.is_matrix()) return 6;
+    if (t.is_string()) return 7;
+    if (t.is_void()) return 9;
+    return 8;
+}
+
+FunctionSymbol* CodeGen::resolveOverload(const std::string& name,
+                                         const std::vector<TypeSpec>& argTypes, const Node* at,
+                                         const TypeSpec* expected, bool report) {
+    auto it = m_functions.find(name);
+    std::string argSig;
+    for (size_t i = 0; i < argTypes.size(); ++i) argSig += (i ? ", " : "") + argTypes[i].string();
+    if (it == m_functions.end()) {
+        if (report) error(at, "function '" + name + "' was not declared in this scope");
+        return nullptr;
+    }
+    auto& cands = it->second;
+    std::vector<std::pair<int, FunctionSymbol*>> scored;
+    for (auto& fp : cands) {
+        FunctionSymbol* f = fp.get();
+        if (argTypes.size() < f->params.size() ||
+            (!f->variadic && argTypes.size() > f->params.size()))
+            continue;
+        int total = 0;
+        for (size_t i = 0; i < f->params.size() && total >= 0; ++i) {
+            int c = conversionCost(argTypes[i], f->params[i].type, f->params[i].output);
+            total = c < 0 ? -1 : total + c;
+        }
+        if (total >= 0) scored.push_back({total, f});
+    }
+    auto location = [](FunctionSymbol* f) {
+        return "    " + f->file + ":" + std::to_string(f->line) + "\t" + f->signature() + "\n";
+    };
+    if (scored.empty()) {
+        if (report) {
+            std::string msg =
+                "No matching function call to '" + name + " (" + argSig + ")'\n  Candidates are:\n";
+            for (auto r = cands.rbegin(); r != cands.rend(); ++r) msg += location(r->get());
+            msg.pop_back();
+            error(at, msg);
+        }
+        return nullptr;
+    }
+    int best = INT_MAX;
+    for (auto& s : scored) best = std::min(best, s.first);
+    std::vector<FunctionSymbol*> ties;
+    for (auto& s : scored)
+        if (s.first == best) ties.push_back(s.second);
+    if (ties.size() == 1) return ties[0];
+    if (expected)
+        for (auto* f : ties)
+            if (f->ret == *expected) return f;
+    // Later declarations win over earlier ones with the same parameters (user overrides).
+    std::stable_sort(ties.begin(), ties.end(), [](FunctionSymbol* a, FunctionSymbol* b) {
+        return returnRank(a->ret) < returnRank(b->ret);
+    });
+    bool allStruct = std::all_of(ties.begin(), ties.end(),
+                                 [](FunctionSymbol* f) { return f->ret.is_structure_based(); });
+    bool user = std::any_of(ties.begin(), ties.end(),
+                            [](FunctionSymbol* f) { return f->file != "stdosl.h"; });
+    bool sameParams = true;
+    for (auto* f : ties) {
+        for (size_t i = 0; i < f->params.size() && i < ties[0]->params.size(); ++i)
+            if (!(f->params[i].type == ties[0]->params[i].type)) sameParams = false;
+        if (f->params.size() != ties[0]->params.size()) sameParams = false;
+    }
+    if (sameParams) {
+        // A user function replaces the library's one with the same parameters.
+        for (auto r = cands.rbegin(); r != cands.rend(); ++r)
+            if (std::find(ties.begin(), ties.end(), r->get()) != ties.end() &&
+                (*r)->file != "stdosl.h" &&
+                std::all_of(ties.begin(), ties.end(), [&](FunctionSymbol* f) {
+                    return f->ret == (*r)->ret || f->file == "stdosl.h";
+                }))
+                return r->get();
+    }
+    if (report && user) {
+        if (allStruct) {
+            std::string msg =
+                "Ambiguous call to '" + name + " (" + argSig + ")'\n  Candidates are:\n";
+            for (auto r = cands.rbegin(); r != cands.rend(); ++r)
+                if (std::find(ties.begin(), ties.end(), r->get()) != ties.end())
+                    msg += location(r->get());
+            msg.pop_back();
+            error(at, msg);
+            return ties[0];
+        }
+        std::string msg = "Ambiguous call to '" + name + " (" + argSig +
+                          ")'\n  Chosen function is:\n" + location(ties[0]) +
+                          "  Other candidates are:\n";
+        for (auto r = cands.rbegin(); r != cands.rend(); ++r)
+            if (r->get() != ties[0] && std::find(ties.begin(), ties.end(), r->get()) != ties.end())
+                msg += location(r->get());
+        msg.pop_back();
+        warning(at, msg);
+    }
+    return ties[0];
+}
+
+Symbol* CodeGen::structCtor(const Node* e, int structId) {
+    StructSpec* spec = TypeSpec::structspec(structId);
+    TypeSpec t(e->name.c_str(), structId);
+    if (int(e->kids.size()) != spec->numfields()) {
+        error(e, "Constructor for '" + e->name + "' has the wrong number of arguments (expected " +
+                     std::to_string(spec->numfields()) + ", got " + std::to_string(e->kids.size()) +
+                     ")");
+    }
+    if (int(e->kids.size()) > spec->numfields())
+        error(e, "Too many initializers for struct '" + e->name + "'");
+    Symbol* r = temp(t);
+    for (size_t i = 0; i < e->kids.size() && int(i) < spec->numfields(); ++i) {
+        TypeSpec ft = spec->field(int(i)).type;
+        Symbol* v = expr(e->kid(i), &ft);
+        if (!assignable(ft, v->type) && !equivalent(ft, v->type)) {
+            error(e, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " + e->name +
+                         "." + spec->field(int(i)).name.string() + "'");
+            continue;
+        }
+        assignInto(r->fields[i], v, e);
+    }
+    return r;
+}
+
+Symbol* CodeGen::call(const Node* e, const TypeSpec* expected) {
+    auto st = m_structs.find(e->name);
+    if (st != m_structs.end()) return structCtor(e, st->second);
+    bool shadowed = false;
+    for (auto it = m_scopes.rbegin(); it != m_scopes.rend(); ++it)
+        if (it->vars.count(e->name)) shadowed = true;
+    std::vector<Symbol*> args;
+    std::vector<LRef> refs;
+    std::vector<TypeSpec> types;
+    for (const auto& k : e->kids) {
+        const Node* a = k.get();
+        LRef r;
+        if (a->kind == NodeKind::VarRef || a->kind == NodeKind::Index ||
+            a->kind == NodeKind::Field) {
+            r = lvalue(a, false);
+            args.push_back(load(r, a));
+            const_cast<Node*>(a)->type = args.back()->type;
+        } else {
+            args.push_back(expr(a));
+        }
+        refs.push_back(r);
+        types.push_back(args.back()->type);
+    }
+    m_curLine = e->line;
+    m_curFile = e->file;
+    if (shadowed) {
+        error(e, "'" + e->name + "' is not a function");
+        std::string argSig;
+        for (size_t i = 0; i < types.size(); ++i) argSig += (i ? ", " : "") + types[i].string();
+        error(e, "No matching function call to '" + e->name + " (" + argSig + ")'");
+        return temp(kFloat);
+    }
+    FunctionSymbol* fn = resolveOverload(e->name, types, e, expected);
+    if (!fn) return temp(expected && !expected->is_void() ? *expected : kFloat);
+    const_cast<Node*>(e)->func = fn;
+    // Output arguments must be writable.
+    for (size_t i = 0; i < fn->params.size() && i < args.size(); ++i) {
+        if (!fn->params[i].output) continue;
+        if (!refs[i].valid()) {
+            error(e, "Cannot pass an expression as output argument " + std::to_string(i + 1) +
+                         " of " + fn->name + "()");
+            continue;
+        }
+        checkWritable(refs[i].sym, e,
+                      ", as passed to function " + fn->name + "() as arg " + std::to_string(i + 1) +
+                          " (output parameter \"" + fn->params[i].name + "\")");
+    }
+    if (fn->builtin) return builtinCall(fn, e, args, refs, expected);
+    return inlineCall(fn, e, args, refs);
+}
+
+Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
+                             std::vector<LRef>& refs, const TypeSpec*) {
+    std::vector<Symbol*> opargs;
+    std::string rw;
+    Symbol* result = nullptr;
+    if (!fn->ret.is_void()) {
+        result = temp(fn->ret);
+        opargs.push_back(result);
+        rw += 'w';
+    }
+    if (fn->isClosure) {
+        opargs.push_back(constString(fn->name));
+        rw += 'r';
+    }
+    std::vector<std::pair<size_t, Symbol*>> writeBacks;
+    bool nextIsOutput = false;
+    for (size_t i = 0; i < args.size(); ++i) {
+        Symbol* a = args[i];
+        bool out = i < fn->params.size() && fn->params[i].output;
+        if (i >= fn->params.size()) {
+            if (a->type.is_structure_based()) {
+                error(e, "struct '" + a->type.structspec()->name().string() +
+                             "' is not a valid argument");
+                continue;
+            }
+            // Optional texture/attribute arguments named "alpha" etc. are written by the op.
+            out = nextIsOutput;
+            nextIsOutput = false;
+            if (a->isConst() && a->type.is_string() && !a->svals.empty()) {
+                const std::string& s = a->svals[0];
+                nextIsOutput =
+                    (s == "alpha" || s == "errormessage") &&
+                    (fn->name == "texture" || fn->name == "texture3d" || fn->name == "environment");
+            }
+        } else if (!out) {
+            a = convert(a, fn->params[i].type, e);
+        }
+        if (out && (refs[i].index || refs[i].comp)) {
+            Symbol* t = temp(a->type);
+            writeBacks.push_back({i, t});
+            a = t;
+        }
+        opargs.push_back(a);
+        rw += out ? 'w' : 'r';
+    }
+    m_curLine = e->line;
+    emit(fn->isClosure ? "closure" : fn->opname.empty() ? fn->name : fn->opname, opargs, rw);
+    for (auto& wb : writeBacks) store(refs[wb.first], wb.second, e);
+    return result ? result : temp(TypeSpec(TypeDesc(TypeDesc::NONE)));
+}
+
+Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
+                            std::vector<LRef>& refs) {
+    for (const auto& f : m_inline)
+        if (f.fn == fn) {
+            error(e, "Recursive call to function '" + fn->name + "' is not allowed");
+            return temp(fn->ret.is_void() ? kFloat : fn->ret);
+        }
+    if (m_inline.size() > 64) {
+        error(e, "function calls nested too deeply");
+        return temp(kFloat);
+    }
+    if (m_checkOnly && m_currentFunction) {
+        // While checking a function on its own, a call only needs its types.
+        Symbol* r = fn->ret.is_void() ? temp(TypeSpec(TypeDesc(TypeDesc::NONE))) : temp(fn->ret);
+        return r;
+    }
+    const Node* decl = fn->decl;
+    int callop = emit("functioncall", {constString(fn->name)}, "r");
+    Symbol* result = fn->ret.is_void() ? nullptr : temp(fn->ret);
+    std::vector<std::pair<size_t, Symbol*>> writeBacks;
+    auto savedScopes = std::move(m_scopes);
+    m_scopes.clear();
+    m_scopes.push_back(savedScopes.front()); // global scope only
+    pushScope();
+    for (size_t i = 0; i < fn->params.size(); ++i) {
+        const auto& p = fn->params[i];
+        Symbol* a = args[i];
+        if (p.output) {
+            if (refs[i].valid() && !refs[i].index && !refs[i].comp &&
+                equivalent(refs[i].sym->type, p.type)) {
+                a = refs[i].sym;
+            } else {
+                Symbol* t = newStructSymbol(
+                    scopedName(p.name), p.type.is_unsized_array() ? a->type : p.type, SymTypeLocal);
+                assignInto(t, a, e);
+                writeBacks.push_back({i, t});
+                a = t;
+            }
+        } else if (!(a->type == p.type) && !(p.type.is_unsized_array() && a->type.is_array()) &&
+                   !(equivalent(a->type, p.type) && !a->type.is_structure_based())) {
+            a = convert(a, p.type, e);
+        }
+        m_scopes.back().vars[p.name] = a;
+    }
+    m_inline.push_back({fn, result, {}});
+    ++m_silent;
+    FunctionSymbol* savedFn = m_currentFunction;
+    m_currentFunction = nullptr;
+    auto savedLoops = std::move(m_loops);
+    m_loops.clear();
+    pushScope();
+    for (const auto& s : decl->body->kids) statement(s.get());
+    popScope();
+    m_loops = std::move(savedLoops);
+    m_currentFunction = savedFn;
+    --m_silent;
+    InlineFrame frame = m_inline.back();
+    m_inline.pop_back();
+    // A `return` as the last op needs no jump: drop it.
+    if (!frame.returnOps.empty() && frame.returnOps.back() == nextOp() - 1) {
+        int last = nextOp() - 1;
+        m_ops->pop_back();
+        for (int i = callop; i < last; ++i)
+            for (int& j : (*m_ops)[i].jumps)
+                if (j > last) j = last;
+    }
+    (*m_ops)[callop].jumps = {nextOp()};
+    m_scopes = std::move(savedScopes);
+    m_curLine = e->line;
+    m_curFile = e->file;
+    for (auto& wb : writeBacks) store(refs[wb.first], wb.second, e);
+    return result ? result : temp(TypeSpec(TypeDesc(TypeDesc::NONE)));
+}
+
+} // namespace OSL::pvt

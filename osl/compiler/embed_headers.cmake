@@ -1,0 +1,10 @@
+# Writes OUT: a C++ file holding each file of HEADERS as a string, by file name.
+set(body "// Generated from osl/shaders; do not edit.\n#include \"shader_headers.h\"\n\nnamespace OSL::pvt {\n\nconst std::vector<std::pair<std::string, std::string>>& builtinShaderHeaders() {\n    static const std::vector<std::pair<std::string, std::string>> headers = {\n")
+string(REPLACE "|" ";" HEADERS "${HEADERS}")
+foreach(h IN LISTS HEADERS)
+    get_filename_component(name ${h} NAME)
+    file(READ ${h} text)
+    set(body "${body}        {\"${name}\", R\"OSLHEADER(${text})OSLHEADER\"},\n")
+endforeach()
+set(body "${body}    };\n    return headers;\n}\n\n} // namespace OSL::pvt\n")
+file(WRITE ${OUT} "${body}")

@@ -1,0 +1,6 @@
+// color4: an RGB color with alpha.
+#pragma once
+struct color4 {
+    color rgb;
+    float a;
+};
