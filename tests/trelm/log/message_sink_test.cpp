@@ -19,7 +19,8 @@ LogMessage textMessage(std::string text, MessageSeverity severity = MessageSever
 
 TEST(MessageSink, KeepsTheNewestMessagesUpToItsCapacity) {
     MessageSink sink("test", 3);
-    for (int i = 1; i <= 5; ++i) EXPECT_EQ(sink.Add(textMessage("m" + std::to_string(i))), i);
+    for (int i = 1; i <= 5; ++i)
+        EXPECT_EQ(sink.Add(textMessage(std::string("m").append(std::to_string(i)))), i);
     EXPECT_EQ(sink.Size(), 3u);
     EXPECT_EQ(sink.Dropped(), 2u);
     const auto all = sink.Snapshot();
