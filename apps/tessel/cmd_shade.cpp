@@ -29,11 +29,21 @@ class ConsoleErrors final : public ErrorHandler {
 public:
     void operator()(int errcode, const std::string& msg) override {
         switch (errcode & 0xffff0000) {
-        case EH_ERROR: std::printf("ERROR: %s\n", msg.c_str()); break;
-        case EH_SEVERE: std::printf("SEVERE ERROR: %s\n", msg.c_str()); break;
-        case EH_WARNING: std::printf("WARNING: %s\n", msg.c_str()); break;
-        case EH_INFO: std::printf("%s\n", msg.c_str()); break;
-        default: std::printf("%s", msg.c_str()); break;
+        case EH_ERROR:
+            std::printf("ERROR: %s\n", msg.c_str());
+            break;
+        case EH_SEVERE:
+            std::printf("SEVERE ERROR: %s\n", msg.c_str());
+            break;
+        case EH_WARNING:
+            std::printf("WARNING: %s\n", msg.c_str());
+            break;
+        case EH_INFO:
+            std::printf("%s\n", msg.c_str());
+            break;
+        default:
+            std::printf("%s", msg.c_str());
+            break;
         }
         std::fflush(stdout);
     }
@@ -50,6 +60,45 @@ public:
         m_object.rotate(Vec3(0.0f, 0.0f, float(M_PI_2)));
         m_named[ustring("camera")] = Matrix44();
         m_named[ustring("world")] = Matrix44();
+        Matrix44 myspace;
+        myspace.scale(Vec3(1.0f, 2.0f, 1.0f));
+        m_named[ustring("myspace")] = myspace;
+    }
+    void setResolution(int x, int y) { m_xres = x, m_yres = y; }
+
+    // The camera of the grid: a perspective view of the unit square.
+    bool get_attribute(ShaderGlobals*, bool derivatives, ustring, TypeDesc type, ustring name,
+                       void* val) override {
+        const std::string_view n = name.string();
+        auto floats = [&](std::initializer_list<float> v) {
+            if (type != TypeDesc(TypeDesc::FLOAT, int(v.size())) &&
+                !(v.size() == 1 && type == TypeFloat))
+                return false;
+            float* out = static_cast<float*>(val);
+            int k = 0;
+            for (float f : v) out[k++] = f;
+            if (derivatives) std::memset(out + k, 0, 2 * v.size() * sizeof(float));
+            return true;
+        };
+        if (n == "camera:resolution" && type == TypeDesc(TypeDesc::INT, 2)) {
+            static_cast<int*>(val)[0] = m_xres;
+            static_cast<int*>(val)[1] = m_yres;
+            return true;
+        }
+        if (n == "camera:projection" && type == TypeString) {
+            *static_cast<ustring*>(val) = ustring("perspective");
+            return true;
+        }
+        if (n == "camera:fov") return floats({90.0f});
+        if (n == "camera:pixelaspect") return floats({1.0f});
+        if (n == "camera:clip_near") return floats({0.1f});
+        if (n == "camera:clip_far") return floats({1000.0f});
+        if (n == "camera:clip") return floats({0.1f, 1000.0f});
+        if (n == "camera:shutter_open") return floats({0.0f});
+        if (n == "camera:shutter_close") return floats({1.0f});
+        if (n == "camera:shutter") return floats({0.0f, 1.0f});
+        if (n == "camera:screen_window") return floats({-1.0f, -1.0f, 1.0f, 1.0f});
+        return false;
     }
     bool get_matrix(ShaderGlobals*, Matrix44& result, TransformationPtr xform, float) override {
         if (!xform) return false;
@@ -74,6 +123,7 @@ public:
 private:
     Matrix44 m_shader, m_object;
     std::map<ustring, Matrix44> m_named;
+    int m_xres = 1, m_yres = 1;
 };
 
 // The closures a renderer of this kind knows, in the layouts OSL's test renderers use.
@@ -123,15 +173,13 @@ void registerClosures(ShadingSystem& ss) {
                                  CLOSURE_FINISH_PARAM(OrenNayarParams)};
     const ClosureParam translucent[] = {CLOSURE_VECTOR_PARAM(TranslucentParams, N),
                                         CLOSURE_FINISH_PARAM(TranslucentParams)};
-    const ClosureParam phong[] = {CLOSURE_VECTOR_PARAM(PhongParams, N),
-                                  CLOSURE_FLOAT_PARAM(PhongParams, exponent),
-                                  CLOSURE_STRING_KEYPARAM(PhongParams, label, "label"),
-                                  CLOSURE_FINISH_PARAM(PhongParams)};
-    const ClosureParam ward[] = {CLOSURE_VECTOR_PARAM(WardParams, N),
-                                 CLOSURE_VECTOR_PARAM(WardParams, T),
-                                 CLOSURE_FLOAT_PARAM(WardParams, ax),
-                                 CLOSURE_FLOAT_PARAM(WardParams, ay),
-                                 CLOSURE_FINISH_PARAM(WardParams)};
+    const ClosureParam phong[] = {
+        CLOSURE_VECTOR_PARAM(PhongParams, N), CLOSURE_FLOAT_PARAM(PhongParams, exponent),
+        CLOSURE_STRING_KEYPARAM(PhongParams, label, "label"), CLOSURE_FINISH_PARAM(PhongParams)};
+    const ClosureParam ward[] = {
+        CLOSURE_VECTOR_PARAM(WardParams, N), CLOSURE_VECTOR_PARAM(WardParams, T),
+        CLOSURE_FLOAT_PARAM(WardParams, ax), CLOSURE_FLOAT_PARAM(WardParams, ay),
+        CLOSURE_FINISH_PARAM(WardParams)};
     const ClosureParam microfacet[] = {CLOSURE_STRING_PARAM(MicrofacetParams, dist),
                                        CLOSURE_VECTOR_PARAM(MicrofacetParams, N),
                                        CLOSURE_VECTOR_PARAM(MicrofacetParams, U),
@@ -187,7 +235,8 @@ bool setParam(ShadingSystem& ss, ShaderGroup& g, std::string command, const std:
     bool lockgeom = true;
     for (const std::string& opt : OIIO::Strutil::splits(command, ":")) {
         if (OIIO::Strutil::starts_with(opt, "type=")) type = opt.substr(5);
-        if (OIIO::Strutil::starts_with(opt, "lockgeom=")) lockgeom = std::atoi(opt.c_str() + 9) != 0;
+        if (OIIO::Strutil::starts_with(opt, "lockgeom="))
+            lockgeom = std::atoi(opt.c_str() + 9) != 0;
     }
     TypeDesc t;
     if (!type.empty()) {
@@ -214,7 +263,8 @@ bool setParam(ShadingSystem& ss, ShaderGroup& g, std::string command, const std:
     if (t.basetype == TypeDesc::INT) {
         std::vector<int> v(count);
         for (size_t k = 0; k < count; ++k)
-            v[k] = OIIO::Strutil::stoi(parts.empty() ? value : parts[std::min(k, parts.size() - 1)]);
+            v[k] =
+                OIIO::Strutil::stoi(parts.empty() ? value : parts[std::min(k, parts.size() - 1)]);
         return ss.Parameter(g, name, t, v.data(), lockgeom);
     }
     std::vector<float> v(count);
@@ -266,8 +316,8 @@ struct OutputImage {
 };
 
 // Copies the values of the output symbols at one shading point into the images.
-void gatherOutputs(ShadingSystem& ss, ShadingContext& ctx, std::vector<OutputImage>& images,
-                   int x, int y) {
+void gatherOutputs(ShadingSystem& ss, ShadingContext& ctx, std::vector<OutputImage>& images, int x,
+                   int y) {
     for (OutputImage& img : images) {
         if (!img.sym || !img.buf) continue;
         const void* data = ss.symbol_address(ctx, img.sym);
@@ -413,7 +463,7 @@ int runShade(const std::vector<std::string>& args) {
                         args[i + 3].c_str(), args[i + 4].c_str());
             std::fflush(stdout);
             if (!ss.ConnectShaders(*group, args[i + 1], args[i + 2], args[i + 3], args[i + 4]))
-                failed = true;
+                return 1;
             i += 4;
         } else if (base == "-reparam" || base == "-userdata" || base == "-expr" ||
                    base == "-entryoutput" || base == "-groupoutputs") {
@@ -441,8 +491,8 @@ int runShade(const std::vector<std::string>& args) {
     if (!opt.outputs.empty()) {
         std::vector<ustring> names;
         for (const OutputRequest& o : opt.outputs) names.emplace_back(o.symbol);
-        ss.attribute(group.get(), "renderer_outputs",
-                     TypeDesc(TypeDesc::STRING, int(names.size())), names.data());
+        ss.attribute(group.get(), "renderer_outputs", TypeDesc(TypeDesc::STRING, int(names.size())),
+                     names.data());
     }
     if (!opt.entryLayers.empty()) {
         std::vector<ustring> names;
@@ -475,6 +525,7 @@ int runShade(const std::vector<std::string>& args) {
     }
     std::fflush(stdout);
 
+    renderer.setResolution(opt.xres, opt.yres);
     const int raytypeBit = ss.raytype_bit(ustring(opt.raytype));
     const int nthreads = std::min(opt.threads, opt.yres);
     auto shadeRows = [&](int y0, int y1) {
@@ -501,7 +552,7 @@ int runShade(const std::vector<std::string>& args) {
     }
 
     int status = 0;
-    std::printf("\n");
+    if (opt.outputs.empty()) std::printf("\n");
     for (size_t k = 0; k < images.size(); ++k) {
         OutputImage& img = images[k];
         if (!img.buf) continue;

@@ -236,7 +236,8 @@ void loadGlobals(ExecState& st, const ShaderGlobals& sg) {
         float* d = reinterpret_cast<float*>(st.heap + g.offset);
         auto put3 = [&](const Vec3& v, const Vec3& dx, const Vec3& dy) {
             d[0] = v.x, d[1] = v.y, d[2] = v.z;
-            if (g.derivs) d[3] = dx.x, d[4] = dx.y, d[5] = dx.z, d[6] = dy.x, d[7] = dy.y, d[8] = dy.z;
+            if (g.derivs)
+                d[3] = dx.x, d[4] = dx.y, d[5] = dx.z, d[6] = dy.x, d[7] = dy.y, d[8] = dy.z;
         };
         auto put1 = [&](float v, float dx, float dy) {
             d[0] = v;
@@ -244,22 +245,47 @@ void loadGlobals(ExecState& st, const ShaderGlobals& sg) {
         };
         const Vec3 z(0.0f);
         switch (g.id) {
-        case GlobalId::P: put3(sg.P, sg.dPdx, sg.dPdy); break;
-        case GlobalId::I: put3(sg.I, sg.dIdx, sg.dIdy); break;
-        case GlobalId::N: put3(sg.N, z, z); break;
-        case GlobalId::Ng: put3(sg.Ng, z, z); break;
-        case GlobalId::u: put1(sg.u, sg.dudx, sg.dudy); break;
-        case GlobalId::v: put1(sg.v, sg.dvdx, sg.dvdy); break;
-        case GlobalId::dPdu: put3(sg.dPdu, z, z); break;
-        case GlobalId::dPdv: put3(sg.dPdv, z, z); break;
-        case GlobalId::Ps: put3(sg.Ps, sg.dPsdx, sg.dPsdy); break;
-        case GlobalId::time: put1(sg.time, 0, 0); break;
-        case GlobalId::dtime: put1(sg.dtime, 0, 0); break;
-        case GlobalId::dPdtime: put3(sg.dPdtime, z, z); break;
+        case GlobalId::P:
+            put3(sg.P, sg.dPdx, sg.dPdy);
+            break;
+        case GlobalId::I:
+            put3(sg.I, sg.dIdx, sg.dIdy);
+            break;
+        case GlobalId::N:
+            put3(sg.N, z, z);
+            break;
+        case GlobalId::Ng:
+            put3(sg.Ng, z, z);
+            break;
+        case GlobalId::u:
+            put1(sg.u, sg.dudx, sg.dudy);
+            break;
+        case GlobalId::v:
+            put1(sg.v, sg.dvdx, sg.dvdy);
+            break;
+        case GlobalId::dPdu:
+            put3(sg.dPdu, z, z);
+            break;
+        case GlobalId::dPdv:
+            put3(sg.dPdv, z, z);
+            break;
+        case GlobalId::Ps:
+            put3(sg.Ps, sg.dPsdx, sg.dPsdy);
+            break;
+        case GlobalId::time:
+            put1(sg.time, 0, 0);
+            break;
+        case GlobalId::dtime:
+            put1(sg.dtime, 0, 0);
+            break;
+        case GlobalId::dPdtime:
+            put3(sg.dPdtime, z, z);
+            break;
         case GlobalId::Ci:
             *reinterpret_cast<const ClosureColor**>(st.heap + g.offset) = sg.Ci;
             break;
-        case GlobalId::Other: break;
+        case GlobalId::Other:
+            break;
         }
     }
 }

@@ -12,7 +12,9 @@ namespace OSL {
 
 namespace {
 
-std::string groupSuffix(const ShaderGroup& g) { return "\n        group: " + g.name.string(); }
+std::string groupSuffix(const ShaderGroup& g) {
+    return "\n        group: " + g.name.string();
+}
 
 // "name", "name[3]" (array element, or component of a triple): the base name and index.
 void splitIndex(string_view full, std::string& base, int& index) {
@@ -46,8 +48,8 @@ std::string readFile(const std::string& path, bool& ok) {
 
 } // namespace
 
-bool addParameter(ShadingSystemImpl&, ShaderGroup& g, string_view name, TypeDesc t,
-                  const void* val, bool lockgeom) {
+bool addParameter(ShadingSystemImpl&, ShaderGroup& g, string_view name, TypeDesc t, const void* val,
+                  bool lockgeom) {
     PendingParameter p;
     p.name = ustring(name);
     p.type = t;
@@ -85,8 +87,9 @@ bool addShader(ShadingSystemImpl& sys, ShaderGroup& g, string_view usage, string
         }
         const MasterSymbol& ms = master->symbols[size_t(sym)];
         const TypeDesc st = ms.type.simpletype();
-        const bool numeric = (p.type.basetype == TypeDesc::FLOAT || p.type.basetype == TypeDesc::INT) &&
-                             (st.basetype == TypeDesc::FLOAT || st.basetype == TypeDesc::INT);
+        const bool numeric =
+            (p.type.basetype == TypeDesc::FLOAT || p.type.basetype == TypeDesc::INT) &&
+            (st.basetype == TypeDesc::FLOAT || st.basetype == TypeDesc::INT);
         if (!numeric && p.type.basetype != st.basetype) {
             sys.error("Parameter '" + p.name.string() + "' of shader " + name.string() +
                       " has type " + ms.type.string() + ", cannot be set from " +
@@ -115,8 +118,8 @@ bool connectShaders(ShadingSystemImpl& sys, ShaderGroup& g, string_view srclayer
     }
     const int dl = g.findLayer(ustring(dstlayer));
     if (dl < 0) {
-        sys.error("ConnectShaders: destination layer \"" + std::string(dstlayer) +
-                  "\" not found" + groupSuffix(g));
+        sys.error("ConnectShaders: destination layer \"" + std::string(dstlayer) + "\" not found" +
+                  groupSuffix(g));
         return false;
     }
     if (sl >= dl) {
@@ -277,13 +280,13 @@ std::string serializeGroup(const ShaderGroup& g) {
             if (!v.lockgeom) out << " [[int lockgeom=0]]";
             out << " ;\n";
         }
-        out << "shader " << inst.master->name.string() << " " << inst.layername.string()
-            << " ;\n";
+        out << "shader " << inst.master->name.string() << " " << inst.layername.string() << " ;\n";
     }
     for (const Connection& c : g.connections) {
         auto name = [&](const ConnectedPart& p) {
-            std::string s = g.layers[size_t(p.layer)].layername.string() + "." +
-                            g.layers[size_t(p.layer)].master->symbols[size_t(p.symbol)].name.string();
+            std::string s =
+                g.layers[size_t(p.layer)].layername.string() + "." +
+                g.layers[size_t(p.layer)].master->symbols[size_t(p.symbol)].name.string();
             if (p.arrayIndex >= 0) s += "[" + std::to_string(p.arrayIndex) + "]";
             if (p.component >= 0) s += "[" + std::to_string(p.component) + "]";
             return s;

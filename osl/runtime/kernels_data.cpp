@@ -54,7 +54,8 @@ void kConvert(ExecState& st, const Instr& in) {
                 st.i(R)[rc] = int(v[0]);
             } else {
                 st.f(R)[rc] = v[0];
-                if (R.derivs) st.f(R)[rc + R.size / 4] = v[1], st.f(R)[rc + 2 * (R.size / 4)] = v[2];
+                if (R.derivs)
+                    st.f(R)[rc + R.size / 4] = v[1], st.f(R)[rc + 2 * (R.size / 4)] = v[2];
             }
         }
     }
@@ -135,7 +136,8 @@ void kAassign(ExecState& st, const Instr& in) {
             const int rc = e * R.ncomp + c;
             float* r = st.f(R);
             r[rc] = st.comp(V, c);
-            if (R.derivs) r[rc + R.size / 4] = st.comp(V, c, 1), r[rc + 2 * (R.size / 4)] = st.comp(V, c, 2);
+            if (R.derivs)
+                r[rc + R.size / 4] = st.comp(V, c, 1), r[rc + 2 * (R.size / 4)] = st.comp(V, c, 2);
         }
         return;
     }
@@ -166,7 +168,8 @@ void kTripleSpace(ExecState& st, const Instr& in) {
     const Operand& R = in.args[0];
     Dual2<Vec3> v;
     for (int d = 0; d < 3; ++d)
-        v.elem(d) = Vec3(st.comp(in.args[2], 0, d), st.comp(in.args[3], 0, d), st.comp(in.args[4], 0, d));
+        v.elem(d) =
+            Vec3(st.comp(in.args[2], 0, d), st.comp(in.args[3], 0, d), st.comp(in.args[4], 0, d));
     const ustring space = *st.s(in.args[1]);
     if (Kind == 3) {
         Vec3 rgb;
@@ -281,7 +284,8 @@ void kGetmatrix(ExecState& st, const Instr& in) {
     *st.i(in.args[0]) = ok;
 }
 
-// ---- derivatives ---------------------------------------------------------------------------------
+// ---- derivatives
+// ---------------------------------------------------------------------------------
 
 template <int Which>
 void kDeriv(ExecState& st, const Instr& in) {
@@ -311,8 +315,7 @@ void kCalculatenormal(ExecState& st, const Instr& in) {
 }
 
 bool sameStorage(const Operand& a, const Operand& b) {
-    return a.type.basetype == b.type.basetype && a.ncomp == b.ncomp &&
-           a.arraylen == b.arraylen;
+    return a.type.basetype == b.type.basetype && a.ncomp == b.ncomp && a.arraylen == b.arraylen;
 }
 
 } // namespace

@@ -4,6 +4,8 @@
 
 #include <OSL/dual.h>
 
+#include <OpenImageIO/fmath.h>
+
 #include <cfloat>
 #include <cmath>
 
@@ -13,7 +15,9 @@ namespace {
 
 using D2 = Dual2<float>;
 
-inline D2 mk(const D2& a, float f, float df) { return dualfunc(a, f, df); }
+inline D2 mk(const D2& a, float f, float df) {
+    return dualfunc(a, f, df);
+}
 
 // ---- binary operators ------------------------------------------------------------------------
 
@@ -47,16 +51,11 @@ struct Mod {
     static int i(int a, int b) { return b == 0 ? 0 : a % b; }
 };
 struct Pow {
-    static float v(float x, float y) {
-        if (y == 0.0f) return 1.0f;
-        if (x == 0.0f) return 0.0f;
-        if (x < 0.0f && y != std::floor(y)) return 0.0f;
-        return std::pow(x, y);
-    }
+    static float v(float x, float y) { return OIIO::fast_safe_pow(x, y); }
     static D2 d(const D2& a, const D2& b) {
         const float r = v(a.val(), b.val());
         const float da = a.val() == 0.0f ? 0.0f : b.val() * v(a.val(), b.val() - 1.0f);
-        const float db = a.val() > 0.0f ? r * std::log(a.val()) : 0.0f;
+        const float db = a.val() > 0.0f ? r * OIIO::fast_log(a.val()) : 0.0f;
         D2 out;
         out.val() = r;
         out.dx() = da * a.dx() + db * b.dx();
@@ -65,7 +64,7 @@ struct Pow {
     }
 };
 struct Atan2 {
-    static float v(float y, float x) { return std::atan2(y, x); }
+    static float v(float y, float x) { return OIIO::fast_atan2(y, x); }
     static D2 d(const D2& y, const D2& x) {
         const float denom = x.val() * x.val() + y.val() * y.val();
         D2 r;
@@ -79,7 +78,7 @@ struct Atan2 {
 };
 struct Min {
     static float v(float a, float b) { return a < b ? a : b; }
-    static D2 d(const D2& a, const D2& b) { return a.val() < b.val() ? a : b; }
+    static D2 d(const D2& a, const D2& b) { return a.val() > b.val() ? b : a; }
     static int i(int a, int b) { return a < b ? a : b; }
 };
 struct Max {
@@ -169,39 +168,44 @@ void kMatNeg(ExecState& st, const Instr& in) {
         }                                                                                          \
     };
 
-inline float clampUnit(float x) { return x < -1.0f ? -1.0f : (x > 1.0f ? 1.0f : x); }
-inline float safeLog(float x) { return std::log(x < FLT_MIN ? FLT_MIN : x); }
+inline float clampUnit(float x) {
+    return x < -1.0f ? -1.0f : (x > 1.0f ? 1.0f : x);
+}
 
-UNARY_FN(Sin, std::sin(x), std::cos(x))
-UNARY_FN(Cos, std::cos(x), -std::sin(x))
-UNARY_FN(Tan, std::tan(x), 1.0f / (std::cos(x) * std::cos(x)))
-UNARY_FN(Asin, std::asin(clampUnit(x)), (x > -1.0f && x < 1.0f) ? 1.0f / std::sqrt(1 - x * x) : 0.0f)
-UNARY_FN(Acos, std::acos(clampUnit(x)), (x > -1.0f && x < 1.0f) ? -1.0f / std::sqrt(1 - x * x) : 0.0f)
-UNARY_FN(Atan, std::atan(x), 1.0f / (1.0f + x * x))
-UNARY_FN(Sinh, std::sinh(x), std::cosh(x))
-UNARY_FN(Cosh, std::cosh(x), std::sinh(x))
-UNARY_FN(Tanh, std::tanh(x), 1.0f / (std::cosh(x) * std::cosh(x)))
-UNARY_FN(Exp, std::exp(x), std::exp(x))
-UNARY_FN(Exp2, std::exp2(x), std::exp2(x) * float(M_LN2))
-UNARY_FN(Expm1, std::expm1(x), std::exp(x))
-UNARY_FN(Log, safeLog(x), x < FLT_MIN ? 0.0f : 1.0f / x)
-UNARY_FN(Log2, std::log2(x < FLT_MIN ? FLT_MIN : x), x < FLT_MIN ? 0.0f : 1.0f / (x * float(M_LN2)))
-UNARY_FN(Log10, std::log10(x < FLT_MIN ? FLT_MIN : x), x < FLT_MIN ? 0.0f : 1.0f / (x * float(M_LN10)))
-UNARY_FN(Logb, std::logb(x < FLT_MIN ? FLT_MIN : x), 0.0f)
+UNARY_FN(Sin, OIIO::fast_sin(x), OIIO::fast_cos(x))
+UNARY_FN(Cos, OIIO::fast_cos(x), -OIIO::fast_sin(x))
+UNARY_FN(Tan, OIIO::fast_tan(x), 1.0f / (OIIO::fast_cos(x) * OIIO::fast_cos(x)))
+UNARY_FN(Asin, OIIO::fast_asin(clampUnit(x)),
+         (x > -1.0f && x < 1.0f) ? 1.0f / std::sqrt(1 - x * x) : 0.0f)
+UNARY_FN(Acos, OIIO::fast_acos(clampUnit(x)),
+         (x > -1.0f && x < 1.0f) ? -1.0f / std::sqrt(1 - x * x) : 0.0f)
+UNARY_FN(Atan, OIIO::fast_atan(x), 1.0f / (1.0f + x * x))
+UNARY_FN(Sinh, OIIO::fast_sinh(x), OIIO::fast_cosh(x))
+UNARY_FN(Cosh, OIIO::fast_cosh(x), OIIO::fast_sinh(x))
+UNARY_FN(Tanh, OIIO::fast_tanh(x), 1.0f / (OIIO::fast_cosh(x) * OIIO::fast_cosh(x)))
+UNARY_FN(Exp, OIIO::fast_exp(x), OIIO::fast_exp(x))
+UNARY_FN(Exp2, OIIO::fast_exp2(x), OIIO::fast_exp2(x) * float(M_LN2))
+UNARY_FN(Expm1, OIIO::fast_expm1(x), OIIO::fast_exp(x))
+UNARY_FN(Log, OIIO::fast_log(x), x < FLT_MIN ? 0.0f : 1.0f / x)
+UNARY_FN(Log2, OIIO::fast_log2(x), x < FLT_MIN ? 0.0f : 1.0f / (x * float(M_LN2)))
+UNARY_FN(Log10, OIIO::fast_log10(x), x < FLT_MIN ? 0.0f : 1.0f / (x * float(M_LN10)))
+UNARY_FN(Logb, OIIO::fast_logb(x), 0.0f)
 UNARY_FN(Sqrt, x <= 0.0f ? 0.0f : std::sqrt(x), x <= 0.0f ? 0.0f : 0.5f / std::sqrt(x))
-UNARY_FN(InvSqrt, x <= 0.0f ? 0.0f : 1.0f / std::sqrt(x), x <= 0.0f ? 0.0f : -0.5f / (x * std::sqrt(x)))
-UNARY_FN(Cbrt, std::cbrt(x), x == 0.0f ? 0.0f : 1.0f / (3.0f * std::cbrt(x) * std::cbrt(x)))
+UNARY_FN(InvSqrt, x <= 0.0f ? 0.0f : 1.0f / std::sqrt(x),
+         x <= 0.0f ? 0.0f : -0.5f / (x * std::sqrt(x)))
+UNARY_FN(Cbrt, OIIO::fast_cbrt(x),
+         x == 0.0f ? 0.0f : 1.0f / (3.0f * OIIO::fast_cbrt(x) * OIIO::fast_cbrt(x)))
 UNARY_FN(Abs, std::fabs(x), x >= 0.0f ? 1.0f : -1.0f)
 UNARY_FN(Floor, std::floor(x), 0.0f)
 UNARY_FN(Ceil, std::ceil(x), 0.0f)
 UNARY_FN(Round, std::round(x), 0.0f)
 UNARY_FN(Trunc, std::trunc(x), 0.0f)
 UNARY_FN(Sign, x < 0.0f ? -1.0f : (x > 0.0f ? 1.0f : 0.0f), 0.0f)
-UNARY_FN(Erf, std::erf(x), 2.0f / std::sqrt(float(M_PI)) * std::exp(-x * x))
-UNARY_FN(Erfc, std::erfc(x), -2.0f / std::sqrt(float(M_PI)) * std::exp(-x * x))
+UNARY_FN(Erf, OIIO::fast_erf(x), 2.0f / std::sqrt(float(M_PI)) * std::exp(-x * x))
+UNARY_FN(Erfc, OIIO::fast_erfc(x), -2.0f / std::sqrt(float(M_PI)) * std::exp(-x * x))
 UNARY_FN(Neg, -x, -1.0f)
-UNARY_FN(Radians, x * float(M_PI / 180.0), float(M_PI / 180.0))
-UNARY_FN(Degrees, x * float(180.0 / M_PI), float(180.0 / M_PI))
+UNARY_FN(Radians, x* float(M_PI / 180.0), float(M_PI / 180.0))
+UNARY_FN(Degrees, x* float(180.0 / M_PI), float(180.0 / M_PI))
 
 template <class F, bool D>
 void kUn(ExecState& st, const Instr& in) {
@@ -216,7 +220,9 @@ void kUn(ExecState& st, const Instr& in) {
     }
 }
 
-void kNegInt(ExecState& st, const Instr& in) { *st.i(in.args[0]) = -*st.i(in.args[1]); }
+void kNegInt(ExecState& st, const Instr& in) {
+    *st.i(in.args[0]) = -*st.i(in.args[1]);
+}
 void kAbsInt(ExecState& st, const Instr& in) {
     const int a = *st.i(in.args[1]);
     *st.i(in.args[0]) = a < 0 ? -a : a;
@@ -277,7 +283,8 @@ void kTer(ExecState& st, const Instr& in) {
     const int n = R.ncomp;
     if constexpr (D) {
         for (int c = 0; c < n; ++c)
-            st.store(R, c, F::d(st.dual(in.args[1], c), st.dual(in.args[2], c), st.dual(in.args[3], c)));
+            st.store(R, c,
+                     F::d(st.dual(in.args[1], c), st.dual(in.args[2], c), st.dual(in.args[3], c)));
     } else {
         float* r = st.f(R);
         for (int c = 0; c < n; ++c)
@@ -289,8 +296,7 @@ void kClampInt(ExecState& st, const Instr& in) {
     *st.i(in.args[0]) = x < lo ? lo : (x > hi ? hi : x);
 }
 void kSelectInt(ExecState& st, const Instr& in) {
-    *st.i(in.args[0]) =
-        st.integer(in.args[3]) ? st.integer(in.args[2]) : st.integer(in.args[1]);
+    *st.i(in.args[0]) = st.integer(in.args[3]) ? st.integer(in.args[2]) : st.integer(in.args[1]);
 }
 
 // ---- comparisons and logic -------------------------------------------------------------------
@@ -343,18 +349,22 @@ void kAnd(ExecState& st, const Instr& in) {
 void kOr(ExecState& st, const Instr& in) {
     *st.i(in.args[0]) = truth(st, in.args[1]) || truth(st, in.args[2]);
 }
-void kNot(ExecState& st, const Instr& in) { *st.i(in.args[0]) = !truth(st, in.args[1]); }
+void kNot(ExecState& st, const Instr& in) {
+    *st.i(in.args[0]) = !truth(st, in.args[1]);
+}
 
 template <int Kind>
 void kBits(ExecState& st, const Instr& in) {
     const int a = *st.i(in.args[1]), b = *st.i(in.args[2]);
-    *st.i(in.args[0]) = Kind == 0 ? (a & b)
+    *st.i(in.args[0]) = Kind == 0   ? (a & b)
                         : Kind == 1 ? (a | b)
                         : Kind == 2 ? (a ^ b)
                         : Kind == 3 ? int(unsigned(a) << (b & 31))
                                     : (a >> (b & 31));
 }
-void kCompl(ExecState& st, const Instr& in) { *st.i(in.args[0]) = ~*st.i(in.args[1]); }
+void kCompl(ExecState& st, const Instr& in) {
+    *st.i(in.args[0]) = ~*st.i(in.args[1]);
+}
 
 template <int Kind>
 void kFloatClass(ExecState& st, const Instr& in) {
@@ -396,11 +406,13 @@ void kDistance(ExecState& st, const Instr& in) {
         // Distance from point q to the segment a-b.
         D2 a[3], b[3], q[3];
         for (int c = 0; c < 3; ++c)
-            a[c] = st.dual(in.args[1], c), b[c] = st.dual(in.args[2], c), q[c] = st.dual(in.args[3], c);
+            a[c] = st.dual(in.args[1], c), b[c] = st.dual(in.args[2], c),
+            q[c] = st.dual(in.args[3], c);
         D2 ab[3], aq[3];
         for (int c = 0; c < 3; ++c) ab[c] = b[c] - a[c], aq[c] = q[c] - a[c];
         const D2 len2 = ab[0] * ab[0] + ab[1] * ab[1] + ab[2] * ab[2];
-        D2 t = len2.val() > 0.0f ? (aq[0] * ab[0] + aq[1] * ab[1] + aq[2] * ab[2]) / len2 : D2(0.0f);
+        D2 t =
+            len2.val() > 0.0f ? (aq[0] * ab[0] + aq[1] * ab[1] + aq[2] * ab[2]) / len2 : D2(0.0f);
         if (t.val() < 0.0f) t = D2(0.0f);
         if (t.val() > 1.0f) t = D2(1.0f);
         for (int c = 0; c < 3; ++c) v[c] = q[c] - (a[c] + ab[c] * t);
@@ -413,13 +425,12 @@ void kNormalize(ExecState& st, const Instr& in) {
     D2 v[3];
     for (int c = 0; c < 3; ++c) v[c] = st.dual(in.args[1], c);
     const D2 len = lengthOf(v);
-    for (int c = 0; c < 3; ++c)
-        st.store(in.args[0], c, len.val() == 0.0f ? D2(0.0f) : v[c] / len);
+    for (int c = 0; c < 3; ++c) st.store(in.args[0], c, len.val() == 0.0f ? D2(0.0f) : v[c] / len);
 }
 void kLuminance(ExecState& st, const Instr& in) {
     const Operand& C = in.args[1];
-    const D2 r = st.dual(C, 0) * D2(0.2126f) + st.dual(C, 1) * D2(0.7152f) +
-                 st.dual(C, 2) * D2(0.0722f);
+    const D2 r =
+        st.dual(C, 0) * D2(0.2126f) + st.dual(C, 1) * D2(0.7152f) + st.dual(C, 2) * D2(0.0722f);
     st.store(in.args[0], 0, r);
 }
 
@@ -467,11 +478,16 @@ int selectMathKernel(KernelChoice& k) {
     if (n == 3 && (op == "add" || op == "sub" || op == "mul" || op == "div" || op == "mod")) {
         if (anyClosure()) return 0;
         if (anyMatrix()) {
-            if (op == "mul") k.in.fn = kMatMul;
-            else if (op == "div") k.in.fn = kMatDiv;
-            else if (op == "add") k.in.fn = kMatAddSub<false>;
-            else if (op == "sub") k.in.fn = kMatAddSub<true>;
-            else return k.fail("mod of matrices"), -1;
+            if (op == "mul")
+                k.in.fn = kMatMul;
+            else if (op == "div")
+                k.in.fn = kMatDiv;
+            else if (op == "add")
+                k.in.fn = kMatAddSub<false>;
+            else if (op == "sub")
+                k.in.fn = kMatAddSub<true>;
+            else
+                return k.fail("mod of matrices"), -1;
             return 1;
         }
         bool ok = op == "add"   ? pickBinary<Add>(k, true)
@@ -490,36 +506,43 @@ int selectMathKernel(KernelChoice& k) {
         return ok ? 1 : -1;
     }
     if (op == "neg" && n == 2) {
-        if (k.arg(0).isMatrix) k.in.fn = kMatNeg;
-        else if (k.arg(0).isInt) k.in.fn = kNegInt;
-        else pickUnary<Neg>(k);
+        if (k.arg(0).isMatrix)
+            k.in.fn = kMatNeg;
+        else if (k.arg(0).isInt)
+            k.in.fn = kNegInt;
+        else
+            pickUnary<Neg>(k);
         return 1;
     }
     if ((op == "abs" || op == "fabs") && n == 2) {
-        if (k.arg(0).isInt) k.in.fn = kAbsInt;
-        else pickUnary<Abs>(k);
+        if (k.arg(0).isInt)
+            k.in.fn = kAbsInt;
+        else
+            pickUnary<Abs>(k);
         return 1;
     }
     if (op == "sign" && n == 2) {
-        if (k.arg(0).isInt) k.in.fn = kSignInt;
-        else pickUnary<Sign>(k);
+        if (k.arg(0).isInt)
+            k.in.fn = kSignInt;
+        else
+            pickUnary<Sign>(k);
         return 1;
     }
     if (n == 2 && k.arg(0).isFloat) {
         static const std::pair<const char*, void (*)(KernelChoice&)> unary[] = {
-            {"sin", pickUnary<Sin>},       {"cos", pickUnary<Cos>},
-            {"tan", pickUnary<Tan>},       {"asin", pickUnary<Asin>},
-            {"acos", pickUnary<Acos>},     {"atan", pickUnary<Atan>},
-            {"sinh", pickUnary<Sinh>},     {"cosh", pickUnary<Cosh>},
-            {"tanh", pickUnary<Tanh>},     {"exp", pickUnary<Exp>},
-            {"exp2", pickUnary<Exp2>},     {"expm1", pickUnary<Expm1>},
-            {"log", pickUnary<Log>},       {"log2", pickUnary<Log2>},
-            {"log10", pickUnary<Log10>},   {"logb", pickUnary<Logb>},
-            {"sqrt", pickUnary<Sqrt>},     {"inversesqrt", pickUnary<InvSqrt>},
-            {"cbrt", pickUnary<Cbrt>},     {"floor", pickUnary<Floor>},
-            {"ceil", pickUnary<Ceil>},     {"round", pickUnary<Round>},
-            {"trunc", pickUnary<Trunc>},   {"erf", pickUnary<Erf>},
-            {"erfc", pickUnary<Erfc>},     {"radians", pickUnary<Radians>},
+            {"sin", pickUnary<Sin>},        {"cos", pickUnary<Cos>},
+            {"tan", pickUnary<Tan>},        {"asin", pickUnary<Asin>},
+            {"acos", pickUnary<Acos>},      {"atan", pickUnary<Atan>},
+            {"sinh", pickUnary<Sinh>},      {"cosh", pickUnary<Cosh>},
+            {"tanh", pickUnary<Tanh>},      {"exp", pickUnary<Exp>},
+            {"exp2", pickUnary<Exp2>},      {"expm1", pickUnary<Expm1>},
+            {"log", pickUnary<Log>},        {"log2", pickUnary<Log2>},
+            {"log10", pickUnary<Log10>},    {"logb", pickUnary<Logb>},
+            {"sqrt", pickUnary<Sqrt>},      {"inversesqrt", pickUnary<InvSqrt>},
+            {"cbrt", pickUnary<Cbrt>},      {"floor", pickUnary<Floor>},
+            {"ceil", pickUnary<Ceil>},      {"round", pickUnary<Round>},
+            {"trunc", pickUnary<Trunc>},    {"erf", pickUnary<Erf>},
+            {"erfc", pickUnary<Erfc>},      {"radians", pickUnary<Radians>},
             {"degrees", pickUnary<Degrees>}};
         for (const auto& e : unary)
             if (op == e.first) return e.second(k), 1;
@@ -527,15 +550,19 @@ int selectMathKernel(KernelChoice& k) {
     if (op == "sincos" && n == 3) return k.in.fn = kSincos, 1;
     if (op == "mix" && n == 4) return pickTernary<Mix>(k), 1;
     if (op == "clamp" && n == 4) {
-        if (k.arg(0).isInt) k.in.fn = kClampInt;
-        else pickTernary<Clamp>(k);
+        if (k.arg(0).isInt)
+            k.in.fn = kClampInt;
+        else
+            pickTernary<Clamp>(k);
         return 1;
     }
     if (op == "smoothstep" && n == 4) return pickTernary<Smoothstep>(k), 1;
     if (op == "linearstep" && n == 4) return pickTernary<Linearstep>(k), 1;
     if (op == "select" && n == 4) {
-        if (k.arg(0).isInt) k.in.fn = kSelectInt;
-        else pickTernary<Select>(k);
+        if (k.arg(0).isInt)
+            k.in.fn = kSelectInt;
+        else
+            pickTernary<Select>(k);
         return 1;
     }
     if (op == "eq" && n == 3) return k.in.fn = kEq, 1;

@@ -29,7 +29,8 @@ void kClosure(ExecState& st, const Instr& in) {
         } else if (t.basetype == TypeDesc::INT) {
             *reinterpret_cast<int*>(dst) = st.integer(o);
         } else if (t.basetype == TypeDesc::FLOAT) {
-            const int n = std::min<int>(p.field_size / 4, int(t.aggregate) * std::max(1, t.arraylen));
+            const int n =
+                std::min<int>(p.field_size / 4, int(t.aggregate) * std::max(1, t.arraylen));
             for (int c = 0; c < n; ++c)
                 reinterpret_cast<float*>(dst)[c] = o.isInt ? float(*st.i(o)) : st.comp(o, c);
         } else if (t.basetype == TypeDesc::PTR && o.isClosure) {
@@ -83,9 +84,12 @@ void kClosureAdd(ExecState& st, const Instr& in) {
     s->closureB = b;
     *st.c(in.args[0]) = s;
 }
-void kClosureClear(ExecState& st, const Instr& in) { *st.c(in.args[0]) = nullptr; }
+void kClosureClear(ExecState& st, const Instr& in) {
+    *st.c(in.args[0]) = nullptr;
+}
 
-// ---- sample state ---------------------------------------------------------------------------------
+// ---- sample state
+// ---------------------------------------------------------------------------------
 
 void kRaytype(ExecState& st, const Instr& in) {
     int bit = in.iaux;
@@ -98,14 +102,19 @@ void kRaytype(ExecState& st, const Instr& in) {
     }
     *st.i(in.args[0]) = (st.sg->raytype & bit) != 0;
 }
-void kBackfacing(ExecState& st, const Instr& in) { *st.i(in.args[0]) = st.sg->backfacing; }
+void kBackfacing(ExecState& st, const Instr& in) {
+    *st.i(in.args[0]) = st.sg->backfacing;
+}
 void kSurfacearea(ExecState& st, const Instr& in) {
     st.store(in.args[0], 0, Dual2<float>(st.sg->surfacearea));
 }
-void kConstantInt(ExecState& st, const Instr& in) { *st.i(in.args[0]) = in.iaux; }
+void kConstantInt(ExecState& st, const Instr& in) {
+    *st.i(in.args[0]) = in.iaux;
+}
 void kNop(ExecState&, const Instr&) {}
 
-// ---- attributes -------------------------------------------------------------------------------------
+// ---- attributes
+// -------------------------------------------------------------------------------------
 
 void kGetattribute(ExecState& st, const Instr& in) {
     // Forms: (R, name, dest), (R, object, name, dest), (R, name, index, dest),
@@ -137,8 +146,8 @@ void kGetattribute(ExecState& st, const Instr& in) {
         } else if (n == "shader:groupname") {
             putString(g.name);
         } else {
-            ok = sys.renderer && sys.renderer->get_attribute(st.sg, dest.derivs, object, type,
-                                                             name, val);
+            ok = sys.renderer &&
+                 sys.renderer->get_attribute(st.sg, dest.derivs, object, type, name, val);
         }
     } else if (sys.renderer) {
         if (indexed) {
@@ -155,31 +164,63 @@ void kGetattribute(ExecState& st, const Instr& in) {
     *st.i(R) = ok;
 }
 
-// ---- messages ---------------------------------------------------------------------------------------
+// ---- messages
+// ---------------------------------------------------------------------------------------
+
+const MasterOp& sourceOf(const ExecState& st, const Instr& in) {
+    return st.prog->group->layers[size_t(in.layer)].master->ops[size_t(in.masterOp)];
+}
+
+std::string where(const ustring& file, int line) {
+    return file.string() + ":" + std::to_string(line);
+}
+
+MessageRecord* findMessage(ShadingContext& ctx, ustring name) {
+    for (MessageRecord& m : ctx.messages)
+        if (m.live && m.name == name) return &m;
+    return nullptr;
+}
+
+MessageRecord& newMessage(ShadingContext& ctx) {
+    for (MessageRecord& m : ctx.messages)
+        if (!m.live) return m;
+    ctx.messages.emplace_back();
+    return ctx.messages.back();
+}
+
+std::string typeName(TypeDesc t) {
+    return t.basetype == TypeDesc::PTR ? std::string("closure color") : std::string(t.c_str());
+}
 
 void kSetmessage(ExecState& st, const Instr& in) {
     const ustring name = *st.s(in.args[0]);
     const Operand& v = in.args[1];
     ShadingContext& ctx = *st.ctx;
-    MessageRecord* rec = nullptr;
-    for (MessageRecord& m : ctx.messages)
-        if (m.live && m.name == name) rec = &m;
-    if (!rec)
-        for (MessageRecord& m : ctx.messages)
-            if (!m.live) {
-                rec = &m;
-                break;
-            }
-    if (!rec) {
-        ctx.messages.emplace_back();
-        rec = &ctx.messages.back();
+    const MasterOp& op = sourceOf(st, in);
+    if (MessageRecord* old = findMessage(ctx, name)) {
+        if (old->queriedOnly)
+            shaderError(st, in,
+                        "message \"" + name.string() +
+                            "\" was queried before being set (queried here: " +
+                            where(old->file, old->line) + ") setting it now (" +
+                            where(op.sourcefile, op.line) + ") would lead to inconsistent results");
+        else
+            shaderError(st, in,
+                        "message \"" + name.string() +
+                            "\" already exists (created here: " + where(old->file, old->line) +
+                            ") cannot set again from " + where(op.sourcefile, op.line));
+        return;
     }
-    rec->live = true;
-    rec->name = name;
-    rec->type = v.type;
-    rec->layer = in.layer;
-    rec->derivs = v.derivs;
-    rec->data.assign(st.heap + v.offset, st.heap + v.offset + v.size * (v.derivs ? 3 : 1));
+    MessageRecord& rec = newMessage(ctx);
+    rec.live = true;
+    rec.queriedOnly = false;
+    rec.name = name;
+    rec.type = v.type;
+    rec.layer = in.layer;
+    rec.derivs = v.derivs;
+    rec.file = op.sourcefile;
+    rec.line = op.line;
+    rec.data.assign(st.heap + v.offset, st.heap + v.offset + v.size * (v.derivs ? 3 : 1));
 }
 
 void kGetmessage(ExecState& st, const Instr& in) {
@@ -188,50 +229,61 @@ void kGetmessage(ExecState& st, const Instr& in) {
     const ustring name = *st.s(in.args[hasSource ? 2 : 1]);
     const Operand& dest = in.args[in.nargs - 1];
     ShadingContext& ctx = *st.ctx;
-    if (!source.empty() && source.string() != "") {
+    if (!source.empty()) {
         ShadingSystemImpl& sys = *ctx.system;
         const bool ok = sys.renderer && sys.renderer->getmessage(st.sg, source, name, dest.type,
                                                                  st.p(dest), dest.derivs);
         *st.i(in.args[0]) = ok;
         return;
     }
-    for (const MessageRecord& m : ctx.messages) {
-        if (!m.live || m.name != name) continue;
-        if (m.type != dest.type) {
-            shaderError(st, in,
-                        "type mismatch in getmessage(\"" + name.string() + "\"): message is " +
-                            std::string(m.type.c_str()) + ", destination is " +
-                            std::string(dest.type.c_str()));
-            *st.i(in.args[0]) = 0;
-            return;
-        }
-        std::memcpy(st.p(dest), m.data.data(), dest.size);
-        if (dest.derivs) {
-            if (m.derivs)
-                std::memcpy(st.heap + dest.offset + dest.size, m.data.data() + dest.size,
-                            2 * dest.size);
-            else
-                st.zeroDerivs(dest);
-        }
-        *st.i(in.args[0]) = 1;
+    const MasterOp& op = sourceOf(st, in);
+    MessageRecord* m = findMessage(ctx, name);
+    if (!m) {
+        MessageRecord& rec = newMessage(ctx);
+        rec.live = true;
+        rec.queriedOnly = true;
+        rec.name = name;
+        rec.file = op.sourcefile;
+        rec.line = op.line;
+        *st.i(in.args[0]) = 0;
         return;
     }
-    *st.i(in.args[0]) = 0;
+    if (m->queriedOnly) {
+        *st.i(in.args[0]) = 0;
+        return;
+    }
+    if (m->type != dest.type) {
+        shaderError(st, in,
+                    "type mismatch for message \"" + name.string() + "\" (created as " +
+                        typeName(m->type) + " here: " + where(m->file, m->line) +
+                        ") cannot fetch as " + typeName(dest.type) + " from " +
+                        where(op.sourcefile, op.line));
+        *st.i(in.args[0]) = 0;
+        return;
+    }
+    std::memcpy(st.p(dest), m->data.data(), dest.size);
+    if (dest.derivs) {
+        if (m->derivs)
+            std::memcpy(st.heap + dest.offset + dest.size, m->data.data() + dest.size,
+                        2 * dest.size);
+        else
+            st.zeroDerivs(dest);
+    }
+    *st.i(in.args[0]) = 1;
 }
 
 bool isFlowOp(std::string_view op, Flow& flow) {
-    static const std::pair<const char*, Flow> table[] = {
-        {"if", Flow::If},
-        {"for", Flow::For},
-        {"while", Flow::While},
-        {"dowhile", Flow::DoWhile},
-        {"functioncall", Flow::FunctionCall},
-        {"functioncall_nr", Flow::FunctionCall},
-        {"return", Flow::Return},
-        {"break", Flow::Break},
-        {"continue", Flow::Continue},
-        {"exit", Flow::Exit},
-        {"end", Flow::End}};
+    static const std::pair<const char*, Flow> table[] = {{"if", Flow::If},
+                                                         {"for", Flow::For},
+                                                         {"while", Flow::While},
+                                                         {"dowhile", Flow::DoWhile},
+                                                         {"functioncall", Flow::FunctionCall},
+                                                         {"functioncall_nr", Flow::FunctionCall},
+                                                         {"return", Flow::Return},
+                                                         {"break", Flow::Break},
+                                                         {"continue", Flow::Continue},
+                                                         {"exit", Flow::Exit},
+                                                         {"end", Flow::End}};
     for (const auto& e : table)
         if (op == e.first) {
             flow = e.second;
@@ -248,10 +300,15 @@ int selectShadingKernel(KernelChoice& k) {
     if (op == "closure" && n >= 2) {
         const bool weighted = !k.arg(1).isString;
         const Operand& nameOp = k.arg(weighted ? 2 : 1);
-        if (!nameOp.isString || !nameOp.isConst) return k.fail("closure name is not a constant"), -1;
-        const ustring name = *reinterpret_cast<const ustring*>(k.prog.initImage.data() + nameOp.offset);
+        if (!nameOp.isString || !nameOp.isConst)
+            return k.fail("closure name is not a constant"), -1;
+        const ustring name =
+            *reinterpret_cast<const ustring*>(k.prog.initImage.data() + nameOp.offset);
         const ClosureEntry* e = k.sys.findClosure(name);
-        if (!e) return k.fail("Closure '" + name.string() + "' is not supported by the current renderer"), -1;
+        if (!e)
+            return k.fail("Closure '" + name.string() +
+                          "' is not supported by the current renderer"),
+                   -1;
         k.in.fn = kClosure;
         k.in.aux = e;
         k.in.iaux = weighted;
@@ -309,8 +366,8 @@ bool selectKernel(ShadingSystemImpl& sys, Program& prog, Instr& in, ustring opna
         return true;
     }
     KernelChoice k{sys, prog, in, opname, error};
-    for (auto family : {selectShadingKernel, selectMathKernel, selectDataKernel,
-                        selectStringKernel}) {
+    for (auto family :
+         {selectShadingKernel, selectMathKernel, selectDataKernel, selectStringKernel}) {
         const int r = family(k);
         if (r > 0) return true;
         if (r < 0) return false;

@@ -66,52 +66,26 @@ void formatScalar(std::string& out, const std::string& spec, char conv, const Ex
 
 } // namespace
 
-void formatClosure(const ClosureColor* c, const ShadingSystemImpl& sys, std::string& out) {
-    if (!c) return;
-    if (c->id == ClosureColor::ADD) {
-        formatClosure(c->as_add()->closureA, sys, out);
-        out += "\n";
-        formatClosure(c->as_add()->closureB, sys, out);
-        return;
-    }
-    if (c->id == ClosureColor::MUL) {
-        // Products are printed folded into the components below them.
-        const ClosureMul* m = c->as_mul();
-        std::string inner;
-        formatClosure(m->closure, sys, inner);
-        out += inner;
-        return;
-    }
-    const ClosureComponent* comp = c->as_comp();
-    char buf[128];
-    std::snprintf(buf, sizeof buf, "(%g, %g, %g) * ", double(comp->w.x), double(comp->w.y),
-                  double(comp->w.z));
-    out += buf;
-    const ClosureEntry* entry = nullptr;
-    for (const ClosureEntry& e : sys.closures)
-        if (e.id == c->id) entry = &e;
-    if (!entry) {
-        out += "unknown";
-        return;
-    }
-    out += entry->name.string();
-    out += " (";
-    const char* data = static_cast<const char*>(comp->data());
-    bool first = true;
-    for (const ClosureParam& p : entry->params) {
-        if (p.key) continue;
-        if (!first) out += ", ";
-        first = false;
-        const TypeDesc t = p.type;
-        if (t.basetype == TypeDesc::STRING) {
+namespace {
+
+void formatClosureParam(const ClosureParam& p, const char* data, std::string& out) {
+    char buf[64];
+    const TypeDesc t = p.type;
+    const char* at = data + p.offset;
+    const int elems = std::max(1, t.arraylen);
+    const TypeDesc el = t.elementtype();
+    if (t.arraylen > 0) out += "[";
+    for (int e = 0; e < elems; ++e) {
+        if (e) out += ", ";
+        if (el.basetype == TypeDesc::STRING) {
             out += "\"";
-            out += reinterpret_cast<const ustring*>(data + p.offset)->string();
+            out += reinterpret_cast<const ustring*>(at)[e].string();
             out += "\"";
-        } else if (t.basetype == TypeDesc::INT) {
-            out += std::to_string(*reinterpret_cast<const int*>(data + p.offset));
-        } else if (t.basetype == TypeDesc::FLOAT) {
-            const float* f = reinterpret_cast<const float*>(data + p.offset);
-            const int n = int(t.aggregate) * std::max(1, t.arraylen);
+        } else if (el.basetype == TypeDesc::INT) {
+            out += std::to_string(reinterpret_cast<const int*>(at)[e]);
+        } else if (el.basetype == TypeDesc::FLOAT) {
+            const int n = int(el.aggregate);
+            const float* f = reinterpret_cast<const float*>(at) + e * n;
             if (n > 1) out += "(";
             for (int k = 0; k < n; ++k) {
                 std::snprintf(buf, sizeof buf, "%s%g", k ? ", " : "", double(f[k]));
@@ -120,7 +94,55 @@ void formatClosure(const ClosureColor* c, const ShadingSystemImpl& sys, std::str
             if (n > 1) out += ")";
         }
     }
+    if (t.arraylen > 0) out += "]";
+}
+
+void formatClosureTree(const ClosureColor* c, const ShadingSystemImpl& sys, const Color3& w,
+                       std::string& out) {
+    if (!c) return;
+    if (c->id == ClosureColor::ADD) {
+        formatClosureTree(c->as_add()->closureA, sys, w, out);
+        out += "\n\t+ ";
+        formatClosureTree(c->as_add()->closureB, sys, w, out);
+        return;
+    }
+    if (c->id == ClosureColor::MUL) {
+        formatClosureTree(c->as_mul()->closure, sys, w * c->as_mul()->weight, out);
+        return;
+    }
+    const ClosureComponent* comp = c->as_comp();
+    char buf[128];
+    std::snprintf(buf, sizeof buf, "(%g, %g, %g) * ", double(w.x * comp->w.x),
+                  double(w.y * comp->w.y), double(w.z * comp->w.z));
+    out += buf;
+    const ClosureEntry* entry = nullptr;
+    for (const ClosureEntry& e : sys.closures)
+        if (e.id == c->id) entry = &e;
+    if (!entry) {
+        out += "unknown ()";
+        return;
+    }
+    out += entry->name.string();
+    out += " (";
+    const char* data = static_cast<const char*>(comp->data());
+    bool first = true;
+    for (const ClosureParam& p : entry->params) {
+        if (!first) out += ", ";
+        first = false;
+        if (p.key) {
+            out += "\"";
+            out += p.key;
+            out += "\", ";
+        }
+        formatClosureParam(p, data, out);
+    }
     out += ")";
+}
+
+} // namespace
+
+void formatClosure(const ClosureColor* c, const ShadingSystemImpl& sys, std::string& out) {
+    formatClosureTree(c, sys, Color3(1.0f), out);
 }
 
 void oslFormat(const ExecState& st, ustring fmt, const Operand* args, int nargs, std::string& out) {

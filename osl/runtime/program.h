@@ -99,7 +99,20 @@ struct ConnectionCopy {
 };
 
 enum class GlobalId : uint8_t {
-    P, I, N, Ng, u, v, dPdu, dPdv, Ps, time, dtime, dPdtime, Ci, Other
+    P,
+    I,
+    N,
+    Ng,
+    u,
+    v,
+    dPdu,
+    dPdv,
+    Ps,
+    time,
+    dtime,
+    dPdtime,
+    Ci,
+    Other
 };
 
 struct GlobalSlot {

@@ -22,10 +22,10 @@ bool derivCapable(const TypeSpec& t) {
 
 GlobalId globalId(ustring n) {
     static const std::pair<const char*, GlobalId> table[] = {
-        {"P", GlobalId::P},         {"I", GlobalId::I},         {"N", GlobalId::N},
-        {"Ng", GlobalId::Ng},       {"u", GlobalId::u},         {"v", GlobalId::v},
-        {"dPdu", GlobalId::dPdu},   {"dPdv", GlobalId::dPdv},   {"Ps", GlobalId::Ps},
-        {"time", GlobalId::time},   {"dtime", GlobalId::dtime}, {"dPdtime", GlobalId::dPdtime},
+        {"P", GlobalId::P},       {"I", GlobalId::I},         {"N", GlobalId::N},
+        {"Ng", GlobalId::Ng},     {"u", GlobalId::u},         {"v", GlobalId::v},
+        {"dPdu", GlobalId::dPdu}, {"dPdv", GlobalId::dPdv},   {"Ps", GlobalId::Ps},
+        {"time", GlobalId::time}, {"dtime", GlobalId::dtime}, {"dPdtime", GlobalId::dPdtime},
         {"Ci", GlobalId::Ci}};
     for (const auto& e : table)
         if (n == e.first) return e.second;
@@ -40,7 +40,7 @@ int arrayLengthOf(const MasterSymbol& s, const InstanceValue* iv) {
     const int per = std::max<int>(1, int(el.aggregate));
     size_t n = el.basetype == TypeDesc::STRING ? s.sdefaults.size()
                : el.basetype == TypeDesc::INT  ? s.idefaults.size()
-                                                : s.fdefaults.size();
+                                               : s.fdefaults.size();
     return std::max<int>(1, int(n) / per);
 }
 
@@ -103,7 +103,9 @@ void writeValue(char* dst, TypeDesc t, const MasterSymbol& s, const InstanceValu
     }
 }
 
-uint32_t align8(uint32_t x) { return (x + 7u) & ~7u; }
+uint32_t align8(uint32_t x) {
+    return (x + 7u) & ~7u;
+}
 
 } // namespace
 
@@ -370,8 +372,8 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
         std::string why;
         if (!selectKernel(sys, *prog, in, op.opname, why)) {
             error = "layer \"" + group.layers[in.layer].layername.string() + "\" (shader " +
-                    group.layers[in.layer].master->name.string() + "), op " +
-                    op.opname.string() + ": " + why;
+                    group.layers[in.layer].master->name.string() + "), op " + op.opname.string() +
+                    ": " + why;
             return nullptr;
         }
     }
@@ -393,6 +395,16 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
                     if (ro == ms.name ||
                         ro.string() == inst.layername.string() + "." + ms.name.string())
                         pl.runsEagerly = true;
+        // A layer that writes globals (Ci, N...) runs up front, so that downstream layers see
+        // what it wrote whether or not they read one of its outputs.
+        bool writesGlobals = false;
+        for (const MasterSymbol& ms : inst.master->symbols)
+            if (ms.symtype == SymTypeGlobal && ms.firstWrite >= 0 && ms.firstWrite <= ms.lastWrite)
+                writesGlobals = true;
+        bool feedsOthers = false;
+        for (const Connection& c : group.connections)
+            if (c.src.layer == l) feedsOthers = true;
+        if (writesGlobals && feedsOthers) pl.runsEagerly = true;
         if (!sys.lazyLayers) pl.runsEagerly = true;
     }
     return prog;

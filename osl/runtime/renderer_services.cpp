@@ -9,7 +9,9 @@ namespace OSL {
 
 RendererServices::RendererServices(TextureSystem* texsys) : m_texturesys(texsys) {}
 
-int RendererServices::supports(string_view) const { return false; }
+int RendererServices::supports(string_view) const {
+    return false;
+}
 
 bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, TransformationPtr, float) {
     return false;
@@ -20,29 +22,35 @@ bool RendererServices::get_inverse_matrix(ShaderGlobals* sg, Matrix44& result,
     result.invert();
     return true;
 }
-bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, TransformationPtr) { return false; }
+bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, TransformationPtr) {
+    return false;
+}
 bool RendererServices::get_inverse_matrix(ShaderGlobals* sg, Matrix44& result,
                                           TransformationPtr xform) {
     if (!get_matrix(sg, result, xform)) return false;
     result.invert();
     return true;
 }
-bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, ustring, float) { return false; }
+bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, ustring, float) {
+    return false;
+}
 bool RendererServices::get_inverse_matrix(ShaderGlobals* sg, Matrix44& result, ustring to,
                                           float time) {
     if (!get_matrix(sg, result, to, time)) return false;
     result.invert();
     return true;
 }
-bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, ustring) { return false; }
+bool RendererServices::get_matrix(ShaderGlobals*, Matrix44&, ustring) {
+    return false;
+}
 bool RendererServices::get_inverse_matrix(ShaderGlobals* sg, Matrix44& result, ustring to) {
     if (!get_matrix(sg, result, to)) return false;
     result.invert();
     return true;
 }
 
-bool RendererServices::transform_points(ShaderGlobals*, ustring, ustring, float, const Vec3*,
-                                        Vec3*, int, TypeDesc::VECSEMANTICS) {
+bool RendererServices::transform_points(ShaderGlobals*, ustring, ustring, float, const Vec3*, Vec3*,
+                                        int, TypeDesc::VECSEMANTICS) {
     return false;
 }
 
@@ -57,9 +65,8 @@ bool RendererServices::get_userdata(bool, ustring, TypeDesc, ShaderGlobals*, voi
     return false;
 }
 
-RendererServices::TextureHandle* RendererServices::get_texture_handle(ustring filename,
-                                                                      ShadingContext*,
-                                                                      const TextureOpt*) {
+RendererServices::TextureHandle*
+RendererServices::get_texture_handle(ustring filename, ShadingContext*, const TextureOpt*) {
     TextureSystem* ts = texturesys();
     return ts ? ts->get_texture_handle(filename) : nullptr;
 }
@@ -85,8 +92,8 @@ bool RendererServices::texture(ustring filename, TextureHandle* handle, TextureP
                                float* dresultds, float* dresultdt, ustring* errormessage) {
     TextureSystem* ts = texturesys();
     if (!ts) return false;
-    bool ok = handle ? ts->texture(handle, thread, options, s, t, dsdx, dtdx, dsdy, dtdy,
-                                   nchannels, result, dresultds, dresultdt)
+    bool ok = handle ? ts->texture(handle, thread, options, s, t, dsdx, dtdx, dsdy, dtdy, nchannels,
+                                   result, dresultds, dresultdt)
                      : ts->texture(filename, options, s, t, dsdx, dtdx, dsdy, dtdy, nchannels,
                                    result, dresultds, dresultdt);
     if (!ok) takeError(ts, errormessage);
@@ -110,9 +117,9 @@ bool RendererServices::texture3d(ustring filename, TextureHandle* handle, Textur
 
 bool RendererServices::environment(ustring filename, TextureHandle* handle,
                                    TexturePerthread* thread, TextureOpt& options, ShaderGlobals*,
-                                   const Vec3& R, const Vec3& dRdx, const Vec3& dRdy,
-                                   int nchannels, float* result, float* dresultds,
-                                   float* dresultdt, ustring* errormessage) {
+                                   const Vec3& R, const Vec3& dRdx, const Vec3& dRdy, int nchannels,
+                                   float* result, float* dresultds, float* dresultdt,
+                                   ustring* errormessage) {
     TextureSystem* ts = texturesys();
     if (!ts) return false;
     bool ok = handle ? ts->environment(handle, thread, options, R, dRdx, dRdy, nchannels, result,
@@ -136,9 +143,9 @@ bool RendererServices::get_texture_info(ustring filename, TextureHandle* handle,
 }
 
 bool RendererServices::get_texture_info(ustring filename, TextureHandle* handle, float, float,
-                                        TexturePerthread* thread, ShadingContext* ctx,
-                                        int subimage, ustring dataname, TypeDesc datatype,
-                                        void* data, ustring* errormessage) {
+                                        TexturePerthread* thread, ShadingContext* ctx, int subimage,
+                                        ustring dataname, TypeDesc datatype, void* data,
+                                        ustring* errormessage) {
     return get_texture_info(filename, handle, thread, ctx, subimage, dataname, datatype, data,
                             errormessage);
 }
@@ -147,12 +154,12 @@ int RendererServices::pointcloud_search(ShaderGlobals*, ustring, const Vec3&, fl
                                         size_t*, float*, int) {
     return 0;
 }
-int RendererServices::pointcloud_get(ShaderGlobals*, ustring, const size_t*, int, ustring,
-                                     TypeDesc, void*) {
+int RendererServices::pointcloud_get(ShaderGlobals*, ustring, const size_t*, int, ustring, TypeDesc,
+                                     void*) {
     return 0;
 }
-bool RendererServices::pointcloud_write(ShaderGlobals*, ustring, const Vec3&, int,
-                                        const ustring*, const TypeDesc*, const void**) {
+bool RendererServices::pointcloud_write(ShaderGlobals*, ustring, const Vec3&, int, const ustring*,
+                                        const TypeDesc*, const void**) {
     return false;
 }
 
@@ -164,6 +171,8 @@ bool RendererServices::getmessage(ShaderGlobals*, ustring, ustring, TypeDesc, vo
     return false;
 }
 
-TextureSystem* RendererServices::texturesys() const { return m_texturesys; }
+TextureSystem* RendererServices::texturesys() const {
+    return m_texturesys;
+}
 
 } // namespace OSL

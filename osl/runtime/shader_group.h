@@ -17,8 +17,8 @@ struct Program;
 
 // A parameter value given before Shader, or held by a layer, in the parameter's storage form.
 struct InstanceValue {
-    int symbol = -1;  // index into the master's symbols
-    TypeDesc type;    // the type the value was given with
+    int symbol = -1; // index into the master's symbols
+    TypeDesc type;   // the type the value was given with
     std::vector<char> data;
     bool lockgeom = true;
 };

@@ -123,10 +123,12 @@ public:
             s.metadata.push_back(std::move(md));
         } else if (hintBody(h, "%read", body)) {
             auto p = splitTopLevel(body);
-            if (p.size() == 2) s.firstRead = std::atoi(p[0].c_str()), s.lastRead = std::atoi(p[1].c_str());
+            if (p.size() == 2)
+                s.firstRead = std::atoi(p[0].c_str()), s.lastRead = std::atoi(p[1].c_str());
         } else if (hintBody(h, "%write", body)) {
             auto p = splitTopLevel(body);
-            if (p.size() == 2) s.firstWrite = std::atoi(p[0].c_str()), s.lastWrite = std::atoi(p[1].c_str());
+            if (p.size() == 2)
+                s.firstWrite = std::atoi(p[0].c_str()), s.lastWrite = std::atoi(p[1].c_str());
         } else if (hintBody(h, "%struct", body)) {
             s.structName = ustring(unquote(body));
         } else if (hintBody(h, "%structfields", body)) {

@@ -40,6 +40,9 @@ struct MessageRecord {
     bool derivs = false;
     std::vector<char> data; // capacity kept between samples
     bool live = false;
+    bool queriedOnly = false; // made by a getmessage that found nothing
+    ustring file;             // where it was set (or first queried)
+    int line = 0;
 };
 
 enum ExecStatus : uint8_t { Running = 0, Returned = 1, Broke = 2, Continued = 4, Exited = 8 };
@@ -57,8 +60,8 @@ public:
     std::vector<uint8_t> paramResolved;
     ClosureArena closures;
     std::vector<MessageRecord> messages;
-    std::string output;   // printf text of the current execute, flushed at its end
-    std::string scratch;  // format buffer
+    std::string output;  // printf text of the current execute, flushed at its end
+    std::string scratch; // format buffer
     ShaderGlobals* sg = nullptr;
     uint8_t status = Running;
     int currentLayer = -1;
@@ -109,9 +112,7 @@ struct ExecState {
             base[c + 2 * stride] = v.dy();
         }
     }
-    Vec3 vec(const Operand& o) const {
-        return Vec3(comp(o, 0), comp(o, 1), comp(o, 2));
-    }
+    Vec3 vec(const Operand& o) const { return Vec3(comp(o, 0), comp(o, 1), comp(o, 2)); }
     Dual2<Vec3> dvec(const Operand& o) const {
         Dual2<Vec3> r;
         for (int d = 0; d < 3; ++d) r.elem(d) = Vec3(comp(o, 0, d), comp(o, 1, d), comp(o, 2, d));

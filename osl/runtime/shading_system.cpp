@@ -17,7 +17,9 @@ namespace {
 std::atomic<int> g_unnamedGroups{0};
 
 // Routes messages to the standard streams when no handler is given.
-ErrorHandler& defaultHandler() { return ErrorHandler::default_handler(); }
+ErrorHandler& defaultHandler() {
+    return ErrorHandler::default_handler();
+}
 
 } // namespace
 
@@ -51,16 +53,21 @@ ShadingSystemImpl::~ShadingSystemImpl() {
 }
 
 const ClosureEntry* ShadingSystemImpl::findClosure(ustring name) const {
-    for (const ClosureEntry& e : closures)
-        if (e.name == name) return &e;
+    // A later registration of a name replaces the earlier one.
+    for (size_t k = closures.size(); k-- > 0;)
+        if (closures[k].name == name) return &closures[k];
     return nullptr;
 }
 
-void ShadingSystemImpl::error(const std::string& msg) const { (*err)(ErrorHandler::EH_ERROR, msg); }
+void ShadingSystemImpl::error(const std::string& msg) const {
+    (*err)(ErrorHandler::EH_ERROR, msg);
+}
 void ShadingSystemImpl::warning(const std::string& msg) const {
     (*err)(ErrorHandler::EH_WARNING, msg);
 }
-void ShadingSystemImpl::info(const std::string& msg) const { (*err)(ErrorHandler::EH_INFO, msg); }
+void ShadingSystemImpl::info(const std::string& msg) const {
+    (*err)(ErrorHandler::EH_INFO, msg);
+}
 void ShadingSystemImpl::message(const std::string& msg) const {
     (*err)(ErrorHandler::EH_MESSAGE, msg);
 }
@@ -92,15 +99,29 @@ bool ShadingSystem::attribute(string_view name, TypeDesc type, const void* val) 
                 return true;
             }
         // Options of the reference's JIT and optimiser that have no meaning for this executor.
-        static const char* accepted[] = {"lazyglobals", "lazyunconnected", "lazy_userdata",
-                                         "userdata_isconnected", "llvm_optimize", "llvm_debug",
-                                         "opt_coalesce_temps", "opt_constant_fold",
-                                         "opt_peephole", "opt_elide_unconnected_outputs",
-                                         "range_checking", "unknown_coordsys_error",
-                                         "connection_error", "strict_messages", "statistics:level",
-                                         "profile", "max_warnings_per_thread", "exec_repeat",
-                                         "buffer_printf", "no_noise", "no_pointcloud",
-                                         "force_derivs", "allow_shader_replacement"};
+        static const char* accepted[] = {"lazyglobals",
+                                         "lazyunconnected",
+                                         "lazy_userdata",
+                                         "userdata_isconnected",
+                                         "llvm_optimize",
+                                         "llvm_debug",
+                                         "opt_coalesce_temps",
+                                         "opt_constant_fold",
+                                         "opt_peephole",
+                                         "opt_elide_unconnected_outputs",
+                                         "range_checking",
+                                         "unknown_coordsys_error",
+                                         "connection_error",
+                                         "strict_messages",
+                                         "statistics:level",
+                                         "profile",
+                                         "max_warnings_per_thread",
+                                         "exec_repeat",
+                                         "buffer_printf",
+                                         "no_noise",
+                                         "no_pointcloud",
+                                         "force_derivs",
+                                         "allow_shader_replacement"};
         for (const char* a : accepted)
             if (name == a) return true;
         return false;
@@ -233,7 +254,8 @@ bool ShadingSystem::attribute(ShaderGroup* group, string_view name, TypeDesc typ
     if (type.basetype == TypeDesc::STRING &&
         (name == "renderer_outputs" || name == "entry_layers")) {
         const int n = std::max(1, type.arraylen);
-        std::vector<ustring> v(static_cast<const ustring*>(val), static_cast<const ustring*>(val) + n);
+        std::vector<ustring> v(static_cast<const ustring*>(val),
+                               static_cast<const ustring*>(val) + n);
         if (name == "renderer_outputs")
             group->rendererOutputs = v;
         else
@@ -308,9 +330,8 @@ bool ShadingSystem::LoadMemoryCompiledShader(string_view shadername, string_view
 
 ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname) {
     auto g = std::make_shared<ShaderGroup>();
-    g->name = groupname.empty()
-                  ? ustring("unnamed_group_" + std::to_string(++g_unnamedGroups))
-                  : ustring(groupname);
+    g->name = groupname.empty() ? ustring("unnamed_group_" + std::to_string(++g_unnamedGroups))
+                                : ustring(groupname);
     m_impl->current = g;
     return g;
 }
@@ -352,8 +373,8 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
                 ok = false;
                 continue;
             }
-            ok &= ConnectShaders(*g, tok[1].substr(0, a), tok[1].substr(a + 1),
-                                 tok[2].substr(0, b), tok[2].substr(b + 1));
+            ok &= ConnectShaders(*g, tok[1].substr(0, a), tok[1].substr(a + 1), tok[2].substr(0, b),
+                                 tok[2].substr(b + 1));
         } else if (tok[0] == "param" && tok.size() >= 3) {
             TypeDesc t(tok[1].c_str());
             const std::string pname = tok[2];
@@ -410,7 +431,9 @@ bool ShadingSystem::ShaderGroupEnd() {
     return ShaderGroupEnd(*g);
 }
 
-bool ShadingSystem::ShaderGroupEnd(ShaderGroup& group) { return endGroup(*m_impl, group); }
+bool ShadingSystem::ShaderGroupEnd(ShaderGroup& group) {
+    return endGroup(*m_impl, group);
+}
 
 bool ShadingSystem::Parameter(string_view name, TypeDesc t, const void* val, bool lockgeom) {
     if (!m_impl->current) {
@@ -438,8 +461,8 @@ bool ShadingSystem::Shader(ShaderGroup& group, string_view usage, string_view sh
     return addShader(*m_impl, group, usage, shadername, layername);
 }
 
-bool ShadingSystem::ConnectShaders(string_view srclayer, string_view srcparam,
-                                   string_view dstlayer, string_view dstparam) {
+bool ShadingSystem::ConnectShaders(string_view srclayer, string_view srcparam, string_view dstlayer,
+                                   string_view dstparam) {
     if (!m_impl->current) {
         m_impl->error("ConnectShaders() called before ShaderGroupBegin()");
         return false;
@@ -482,12 +505,15 @@ bool ShadingSystem::query_closure(const char** name, int* id, const ClosureParam
     return false;
 }
 
-PerThreadInfo* ShadingSystem::create_thread_info() { return new PerThreadInfo; }
+PerThreadInfo* ShadingSystem::create_thread_info() {
+    return new PerThreadInfo;
+}
 
-void ShadingSystem::destroy_thread_info(PerThreadInfo* threadinfo) { delete threadinfo; }
+void ShadingSystem::destroy_thread_info(PerThreadInfo* threadinfo) {
+    delete threadinfo;
+}
 
-ShadingContext* ShadingSystem::get_context(PerThreadInfo* threadinfo,
-                                           TextureSystem::Perthread*) {
+ShadingContext* ShadingSystem::get_context(PerThreadInfo* threadinfo, TextureSystem::Perthread*) {
     if (threadinfo && !threadinfo->freeContexts.empty()) {
         ShadingContext* c = threadinfo->freeContexts.back().release();
         threadinfo->freeContexts.pop_back();
@@ -534,13 +560,12 @@ const ShaderSymbol* ShadingSystem::find_symbol(const ShaderGroup& group, ustring
     return nullptr;
 }
 
-const ShaderSymbol* ShadingSystem::find_symbol(const ShaderGroup& group,
-                                               ustring symbolname) const {
+const ShaderSymbol* ShadingSystem::find_symbol(const ShaderGroup& group, ustring symbolname) const {
     const std::string& full = symbolname.string();
     const size_t dot = full.find('.');
     if (dot != std::string::npos) {
-        if (const ShaderSymbol* s = find_symbol(group, ustring(full.substr(0, dot)),
-                                                ustring(full.substr(dot + 1))))
+        if (const ShaderSymbol* s =
+                find_symbol(group, ustring(full.substr(0, dot)), ustring(full.substr(dot + 1))))
             return s;
     }
     return find_symbol(group, ustring(), symbolname);
@@ -574,8 +599,12 @@ int ShadingSystem::raytype_bit(ustring name) {
     return 0;
 }
 
-TextureSystem* ShadingSystem::texturesys() const { return m_impl->texsys; }
+TextureSystem* ShadingSystem::texturesys() const {
+    return m_impl->texsys;
+}
 
-RendererServices* ShadingSystem::renderer() const { return m_impl->renderer; }
+RendererServices* ShadingSystem::renderer() const {
+    return m_impl->renderer;
+}
 
 } // namespace OSL

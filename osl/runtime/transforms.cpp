@@ -60,12 +60,18 @@ Vec3 hsvToRgb(const Vec3& c) {
     const float f = h - float(hi);
     const float p = v * (1.0f - s), q = v * (1.0f - s * f), t = v * (1.0f - s * (1.0f - f));
     switch (hi) {
-    case 0: return Vec3(v, t, p);
-    case 1: return Vec3(q, v, p);
-    case 2: return Vec3(p, v, t);
-    case 3: return Vec3(p, q, v);
-    case 4: return Vec3(t, p, v);
-    default: return Vec3(v, p, q);
+    case 0:
+        return Vec3(v, t, p);
+    case 1:
+        return Vec3(q, v, p);
+    case 2:
+        return Vec3(p, v, t);
+    case 3:
+        return Vec3(p, q, v);
+    case 4:
+        return Vec3(t, p, v);
+    default:
+        return Vec3(v, p, q);
     }
 }
 Vec3 rgbToHsv(const Vec3& c) {
@@ -76,9 +82,12 @@ Vec3 rgbToHsv(const Vec3& c) {
     const float v = maxcomp;
     if (maxcomp > 0.0f) s = delta / maxcomp;
     if (s > 0.0f) {
-        if (c.x >= maxcomp) h = (c.y - c.z) / delta;
-        else if (c.y >= maxcomp) h = 2.0f + (c.z - c.x) / delta;
-        else h = 4.0f + (c.x - c.y) / delta;
+        if (c.x >= maxcomp)
+            h = (c.y - c.z) / delta;
+        else if (c.y >= maxcomp)
+            h = 2.0f + (c.z - c.x) / delta;
+        else
+            h = 4.0f + (c.x - c.y) / delta;
         h /= 6.0f;
         if (h < 0.0f) h += 1.0f;
     }
@@ -100,9 +109,12 @@ Vec3 rgbToHsl(const Vec3& c) {
     if (maxval != minval) {
         const float d = maxval - minval;
         s = l <= 0.5f ? d / (maxval + minval) : d / (2.0f - maxval - minval);
-        if (c.x == maxval) h = (c.y - c.z) / d;
-        else if (c.y == maxval) h = 2.0f + (c.z - c.x) / d;
-        else h = 4.0f + (c.x - c.y) / d;
+        if (c.x == maxval)
+            h = (c.y - c.z) / d;
+        else if (c.y == maxval)
+            h = 2.0f + (c.z - c.x) / d;
+        else
+            h = 4.0f + (c.x - c.y) / d;
         h /= 6.0f;
         if (h < 0.0f) h += 1.0f;
     }
@@ -113,22 +125,28 @@ Vec3 rgbToHsl(const Vec3& c) {
 const Matrix33 kRgbToXyz(0.412453f, 0.212671f, 0.019334f, 0.357580f, 0.715160f, 0.119193f,
                          0.180423f, 0.072169f, 0.950227f);
 
-Vec3 mul(const Vec3& v, const Matrix33& m) { return v * m; }
+Vec3 mul(const Vec3& v, const Matrix33& m) {
+    return v * m;
+}
 
 } // namespace
 
 bool colorFromSpace(ustring space, const Vec3& c, Vec3& rgb) {
     const std::string_view s = space.string();
-    if (s == "rgb" || s == "RGB" || s == "linear" || s.empty()) rgb = c;
-    else if (s == "hsv") rgb = hsvToRgb(c);
-    else if (s == "hsl") rgb = hslToRgb(c);
+    if (s == "rgb" || s == "RGB" || s == "linear" || s.empty())
+        rgb = c;
+    else if (s == "hsv")
+        rgb = hsvToRgb(c);
+    else if (s == "hsl")
+        rgb = hslToRgb(c);
     else if (s == "YIQ")
         rgb = Vec3(c.x + 0.9557f * c.y + 0.6199f * c.z, c.x - 0.2716f * c.y - 0.6469f * c.z,
                    c.x - 1.1082f * c.y + 1.7051f * c.z);
-    else if (s == "XYZ") rgb = mul(c, kRgbToXyz.inverse());
+    else if (s == "XYZ")
+        rgb = mul(c, kRgbToXyz.inverse());
     else if (s == "xyY") {
-        const Vec3 xyz = c.y > 0.0f ? Vec3(c.x * c.z / c.y, c.z, (1.0f - c.x - c.y) * c.z / c.y)
-                                    : Vec3(0.0f);
+        const Vec3 xyz =
+            c.y > 0.0f ? Vec3(c.x * c.z / c.y, c.z, (1.0f - c.x - c.y) * c.z / c.y) : Vec3(0.0f);
         rgb = mul(xyz, kRgbToXyz.inverse());
     } else
         return false;
@@ -137,14 +155,18 @@ bool colorFromSpace(ustring space, const Vec3& c, Vec3& rgb) {
 
 bool colorToSpace(ustring space, const Vec3& rgb, Vec3& c) {
     const std::string_view s = space.string();
-    if (s == "rgb" || s == "RGB" || s == "linear" || s.empty()) c = rgb;
-    else if (s == "hsv") c = rgbToHsv(rgb);
-    else if (s == "hsl") c = rgbToHsl(rgb);
+    if (s == "rgb" || s == "RGB" || s == "linear" || s.empty())
+        c = rgb;
+    else if (s == "hsv")
+        c = rgbToHsv(rgb);
+    else if (s == "hsl")
+        c = rgbToHsl(rgb);
     else if (s == "YIQ")
         c = Vec3(0.299f * rgb.x + 0.587f * rgb.y + 0.114f * rgb.z,
                  0.596f * rgb.x - 0.275f * rgb.y - 0.321f * rgb.z,
                  0.212f * rgb.x - 0.523f * rgb.y + 0.311f * rgb.z);
-    else if (s == "XYZ") c = mul(rgb, kRgbToXyz);
+    else if (s == "XYZ")
+        c = mul(rgb, kRgbToXyz);
     else if (s == "xyY") {
         const Vec3 xyz = mul(rgb, kRgbToXyz);
         const float sum = xyz.x + xyz.y + xyz.z;

@@ -36,20 +36,30 @@ struct ClosureParam {
     { OSL::TypeDesc::PTR, (int)reckless_offsetof(st, fld), nullptr, (int)fieldsize(st, fld) }
 
 #define CLOSURE_INT_ARRAY_PARAM(st, fld, n)                                                        \
-    { OSL::TypeDesc(OSL::TypeDesc::INT, n), (int)reckless_offsetof(st, fld), nullptr,              \
-      (int)fieldsize(st, fld) }
+    {                                                                                              \
+        OSL::TypeDesc(OSL::TypeDesc::INT, n), (int)reckless_offsetof(st, fld), nullptr,            \
+            (int)fieldsize(st, fld)                                                                \
+    }
 #define CLOSURE_VECTOR_ARRAY_PARAM(st, fld, n)                                                     \
-    { OSL::TypeDesc(OSL::TypeDesc::FLOAT, OSL::TypeDesc::VEC3, OSL::TypeDesc::VECTOR, n),          \
-      (int)reckless_offsetof(st, fld), nullptr, (int)fieldsize(st, fld) }
+    {                                                                                              \
+        OSL::TypeDesc(OSL::TypeDesc::FLOAT, OSL::TypeDesc::VEC3, OSL::TypeDesc::VECTOR, n),        \
+            (int)reckless_offsetof(st, fld), nullptr, (int)fieldsize(st, fld)                      \
+    }
 #define CLOSURE_COLOR_ARRAY_PARAM(st, fld, n)                                                      \
-    { OSL::TypeDesc(OSL::TypeDesc::FLOAT, OSL::TypeDesc::VEC3, OSL::TypeDesc::COLOR, n),           \
-      (int)reckless_offsetof(st, fld), nullptr, (int)fieldsize(st, fld) }
+    {                                                                                              \
+        OSL::TypeDesc(OSL::TypeDesc::FLOAT, OSL::TypeDesc::VEC3, OSL::TypeDesc::COLOR, n),         \
+            (int)reckless_offsetof(st, fld), nullptr, (int)fieldsize(st, fld)                      \
+    }
 #define CLOSURE_FLOAT_ARRAY_PARAM(st, fld, n)                                                      \
-    { OSL::TypeDesc(OSL::TypeDesc::FLOAT, n), (int)reckless_offsetof(st, fld), nullptr,            \
-      (int)fieldsize(st, fld) }
+    {                                                                                              \
+        OSL::TypeDesc(OSL::TypeDesc::FLOAT, n), (int)reckless_offsetof(st, fld), nullptr,          \
+            (int)fieldsize(st, fld)                                                                \
+    }
 #define CLOSURE_STRING_ARRAY_PARAM(st, fld, n)                                                     \
-    { OSL::TypeDesc(OSL::TypeDesc::STRING, n), (int)reckless_offsetof(st, fld), nullptr,           \
-      (int)fieldsize(st, fld) }
+    {                                                                                              \
+        OSL::TypeDesc(OSL::TypeDesc::STRING, n), (int)reckless_offsetof(st, fld), nullptr,         \
+            (int)fieldsize(st, fld)                                                                \
+    }
 
 #define CLOSURE_STRING_KEYPARAM(st, fld, key)                                                      \
     { OSL::TypeDesc::TypeString, (int)reckless_offsetof(st, fld), key, (int)fieldsize(st, fld) }
@@ -62,7 +72,8 @@ struct ClosureParam {
 #define CLOSURE_VECTOR_KEYPARAM(st, fld, key)                                                      \
     { OSL::TypeDesc::TypeVector, (int)reckless_offsetof(st, fld), key, (int)fieldsize(st, fld) }
 
-#define CLOSURE_FINISH_PARAM(st) { OSL::TypeDesc(), (int)sizeof(st), nullptr, (int)alignof(st) }
+#define CLOSURE_FINISH_PARAM(st)                                                                   \
+    { OSL::TypeDesc(), (int)sizeof(st), nullptr, (int)alignof(st) }
 
 struct ClosureComponent;
 struct ClosureMul;

@@ -45,9 +45,7 @@ public:
     }
     bool getattribute(string_view name, TypeDesc type, void* val);
     bool getattribute(string_view name, int& val) { return getattribute(name, TypeInt, &val); }
-    bool getattribute(string_view name, float& val) {
-        return getattribute(name, TypeFloat, &val);
-    }
+    bool getattribute(string_view name, float& val) { return getattribute(name, TypeFloat, &val); }
     bool getattribute(string_view name, ustring& val) {
         return getattribute(name, TypeString, &val);
     }
@@ -101,12 +99,10 @@ public:
     bool execute(ShadingContext& ctx, ShaderGroup& group, int shadeindex, ShaderGlobals& globals,
                  void* userdata_base_ptr = nullptr, void* output_base_ptr = nullptr,
                  bool run = true);
-    bool execute(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& globals,
-                 bool run = true) {
+    bool execute(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& globals, bool run = true) {
         return execute(ctx, group, 0, globals, nullptr, nullptr, run);
     }
-    bool execute(ShadingContext* ctx, ShaderGroup& group, ShaderGlobals& globals,
-                 bool run = true);
+    bool execute(ShadingContext* ctx, ShaderGroup& group, ShaderGlobals& globals, bool run = true);
 
     const ShaderSymbol* find_symbol(const ShaderGroup& group, ustring layername,
                                     ustring symbolname) const;

@@ -52,8 +52,8 @@ public:
                                   const Vec3* Pin, Vec3* Pout, int npoints,
                                   TypeDesc::VECSEMANTICS vectype);
 
-    virtual bool get_attribute(ShaderGlobals* sg, bool derivatives, ustring object,
-                               TypeDesc type, ustring name, void* val);
+    virtual bool get_attribute(ShaderGlobals* sg, bool derivatives, ustring object, TypeDesc type,
+                               ustring name, void* val);
     virtual bool get_array_attribute(ShaderGlobals* sg, bool derivatives, ustring object,
                                      TypeDesc type, ustring name, int index, void* val);
     virtual bool get_userdata(bool derivatives, ustring name, TypeDesc type, ShaderGlobals* sg,
@@ -83,8 +83,8 @@ public:
                                   TexturePerthread* texture_thread_info,
                                   ShadingContext* shading_context, int subimage, ustring dataname,
                                   TypeDesc datatype, void* data, ustring* errormessage);
-    virtual bool get_texture_info(ustring filename, TextureHandle* texture_handle, float s,
-                                  float t, TexturePerthread* texture_thread_info,
+    virtual bool get_texture_info(ustring filename, TextureHandle* texture_handle, float s, float t,
+                                  TexturePerthread* texture_thread_info,
                                   ShadingContext* shading_context, int subimage, ustring dataname,
                                   TypeDesc datatype, void* data, ustring* errormessage);
 
