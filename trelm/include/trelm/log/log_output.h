@@ -26,7 +26,8 @@ public:
     std::filesystem::path LogFile() const;
 
     // The echo writes messages of at least `minimum` severity to stderr (or to `writer` when
-    // one is given: tests and tools capture it that way).
+    // one is given: tests and tools capture it that way). The writer runs under the output's
+    // lock, on the reporting thread: it must not report messages itself.
     void SetEcho(bool on, MessageSeverity minimum = MessageSeverity::Info);
     void SetEchoWriter(std::function<void(const std::string& line)> writer);
     bool EchoEnabled() const;
