@@ -290,17 +290,16 @@ IParamBlock2::Param* IParamBlock2::FindParam(ParamID id) const {
 
 IParamBlock2::Param* IParamBlock2::Locate(ParamID id, int tabIndex, const char* what) const {
     Param* p = FindParam(id);
+    if (p && tabIndex >= 0 && tabIndex < static_cast<int>(p->elements.size())) return p;
+    // Only a failed lookup pays for its message.
     const MSTR where = L"IParamBlock2 '" + desc_->InternalName() + L"' " + FromUTF8(what) + L": ";
     if (!p) {
         ReportSDKError(where + L"no parameter with ID " + std::to_wstring(id));
         return nullptr;
     }
-    if (tabIndex < 0 || tabIndex >= static_cast<int>(p->elements.size())) {
-        ReportSDKError(where + L"parameter " + std::to_wstring(id) + L", index " +
-                       std::to_wstring(tabIndex) + L": " + kTabRangeError);
-        return nullptr;
-    }
-    return p;
+    ReportSDKError(where + L"parameter " + std::to_wstring(id) + L", index " +
+                   std::to_wstring(tabIndex) + L": " + kTabRangeError);
+    return nullptr;
 }
 
 int IParamBlock2::GetParameterType(ParamID id) const {

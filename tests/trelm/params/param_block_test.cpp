@@ -19,8 +19,9 @@ protected:
     }
     void TearDown() override {
         owner->DeleteMe();
-        desc.reset();
+        // Undo records may still hold blocks, which need their descriptor until they go.
         theHold.ClearStacks();
+        desc.reset();
     }
 
     TestClassDesc cd;

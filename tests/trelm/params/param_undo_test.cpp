@@ -22,8 +22,9 @@ protected:
     void TearDown() override {
         EXPECT_EQ(theHold.Level(), 0);
         owner->DeleteMe();
-        desc.reset();
+        // Undo records may still hold blocks, which need their descriptor until they go.
         theHold.ClearStacks();
+        desc.reset();
     }
 
     TestClassDesc cd;
@@ -108,6 +109,8 @@ TEST_F(ParamUndoTest, MapReplacementUndoesAndKeepsTheOldMapAlive) {
     EXPECT_EQ(pb->GetTexmap(kMap), b);
     theHold.ClearStacks();
     EXPECT_EQ(live, 1) << "nothing can bring a back any more";
+    pb->SetValue(kMap, 0, static_cast<ReferenceTarget*>(nullptr));
+    EXPECT_EQ(live, 0);
 }
 
 TEST_F(ParamUndoTest, TableResizeUndoesValuesAndMaps) {

@@ -42,6 +42,8 @@ public:
     // Closes the innermost level; at the outermost level the records become one undo step named
     // name (nothing is pushed when no record was made) and the redo stack is emptied.
     void Accept(const MSTR& name);
+    // The same with a resource string, which may be missing (none): the step is then unnamed.
+    void Accept(const MCHAR* name) { Accept(MSTR(name ? name : L"")); }
     // Closes the innermost level, restoring and dropping its records.
     void Cancel();
     // Restores the current level's records without closing it (as Cancel followed by Begin).

@@ -40,7 +40,8 @@ private:
 };
 
 // The layout of a parameter block: its ID, names, owner class, flags and parameters. Blocks keep
-// a pointer to their descriptor, so a descriptor must outlive every block made from it.
+// a pointer to their descriptor, so a descriptor must outlive every block made from it, including
+// blocks that only undo records still keep (clear the undo stacks before freeing a descriptor).
 // Descriptors are built on the main thread (or at static initialisation) and only read afterwards;
 // render threads may read them concurrently.
 //
