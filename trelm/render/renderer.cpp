@@ -2,6 +2,7 @@
 #include <trelm/core/notifications.h>
 #include <trelm/core/texmap.h>
 #include <trelm/render/renderer.h>
+#include <trelm/scene/active_scene.h>
 #include <trelm/scene/material.h>
 #include <trelm/scene/node.h>
 #include <trelm/scene/object.h>
@@ -74,6 +75,7 @@ bool Renderer::Prepare(Scene& scene, std::string& error) {
     }
     scene_ = &scene;
     settings_ = s;
+    SetActiveScene(&scene);
     scene.FlushNodeChanges();
     BroadcastNotification(NOTIFY_PRE_RENDER, &settings_);
     scene.Update(settings_.time);

@@ -1,4 +1,5 @@
 // Colour spaces, converters and the process-wide colour pipeline settings.
+#include <trelm/core/notifications.h>
 #include <trelm/scene/color_pipeline.h>
 
 #include <algorithm>
@@ -137,6 +138,7 @@ std::string ColorPipelineManager::FileColorSpace(const std::string& declared, bo
 
 void ColorPipelineManager::Changed() {
     for (auto& fn : listeners_) fn();
+    BroadcastNotification(NOTIFY_COLOR_MANAGEMENT_CHANGED, this);
 }
 
 ColorPipelineManager& GetColorPipelineMgr() {

@@ -7,10 +7,6 @@
 
 namespace TrelmSDK {
 
-Scene::~Scene() {
-    for (auto& n : nodes_) n->SetChangeSink(nullptr);
-}
-
 INode* Scene::CreateNode(const MSTR& name) {
     auto node = std::make_unique<INode>(name, nextHandle_++);
     node->SetRenderID(int(nodes_.size()));

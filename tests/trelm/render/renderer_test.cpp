@@ -59,6 +59,26 @@ TEST(Renderer, OneThreadAndManyThreadsGiveTheSameImage) {
     EXPECT_EQ(one.At(0, 0).a, 0);
 }
 
+TEST(Renderer, MapsSwitchedOffLeaveTheMaterialColour) {
+    auto scene = SmallBuiltin(32, 24);
+    for (Light& l : scene->lights) l.color = Color(1, 1, 1);
+    scene->settings.mapsEnabled = false;
+    scene->FindMaterial("Floor")->diffuse = Color(0.5f, 0.5f, 0.5f);
+    const RenderImage image = RenderWith(1, *scene);
+    // Grey material, white lights: a floor pixel is grey. With the checker on (dark cells are
+    // bluish) it would not be.
+    const AColor floor = image.At(2, 22);
+    EXPECT_EQ(floor.a, 1);
+    EXPECT_FLOAT_EQ(floor.r, floor.g);
+    EXPECT_FLOAT_EQ(floor.r, floor.b);
+    Renderer r(1);
+    std::string error;
+    ASSERT_TRUE(r.Prepare(*scene, error));
+    HitShadeContext sc;
+    ASSERT_TRUE(r.HitContext(r.MakeCameraRay(2.5f, 22.5f), sc));
+    EXPECT_FALSE(sc.doMaps);
+}
+
 TEST(Renderer, SendsChangedNodesThenPreRender) {
     auto scene = SmallBuiltin(16, 12);
     Log log;

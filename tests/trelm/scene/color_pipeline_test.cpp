@@ -1,3 +1,4 @@
+#include <trelm/core/notifications.h>
 #include <trelm/scene/color_pipeline.h>
 
 #include <gtest/gtest.h>
@@ -52,12 +53,16 @@ TEST(ColorPipeline, NamesAliasesAndUnknownSpaces) {
 
 TEST(ColorPipeline, ChangesReachListenersAndArraysConvertInPlace) {
     ColorPipelineManager cm;
-    int heard = 0;
+    int heard = 0, broadcasts = 0;
     cm.AddChangeListener([&] { ++heard; });
+    auto count = [](void* param, NotifyInfo*) { ++*static_cast<int*>(param); };
+    RegisterNotification(count, &broadcasts, NOTIFY_COLOR_MANAGEMENT_CHANGED);
     cm.SetColorManagementActive(false);
     cm.SetColorManagementActive(false); // no change, no call
     EXPECT_TRUE(cm.SetRenderingSpace("ACEScg"));
+    UnRegisterNotification(count, &broadcasts, NOTIFY_COLOR_MANAGEMENT_CHANGED);
     EXPECT_EQ(heard, 2);
+    EXPECT_EQ(broadcasts, 2);
     EXPECT_EQ(cm.GetConverter("sRGB", "sRGB"), cm.GetConverter("srgb", "sRGB")); // cached
 
     auto conv = cm.GetConverter("linear", "sRGB");

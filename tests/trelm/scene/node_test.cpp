@@ -1,4 +1,5 @@
 #include <trelm/core/notifications.h>
+#include <trelm/scene/active_scene.h>
 #include <trelm/scene/scene.h>
 
 #include <gtest/gtest.h>
@@ -81,4 +82,20 @@ TEST(Matrix, RotationsComposeAsRowVectors) {
     EXPECT_NEAR(back.x, 1, 1e-5f);
     EXPECT_NEAR(back.y, 0, 1e-5f);
     EXPECT_NEAR(back.z, 0, 1e-5f);
+}
+
+TEST(ActiveScene, RegionInterfaceAnswersFromTheActiveScene) {
+    auto scene = std::make_unique<Scene>();
+    scene->settings.region = {0.1f, 0.2f, 0.6f, 0.9f};
+    SetActiveScene(scene.get());
+    EXPECT_EQ(GetActiveScene(), scene.get());
+    auto* region = dynamic_cast<IRenderRegion*>(GetCOREInterface(RENDER_REGION_INTERFACE_ID));
+    ASSERT_TRUE(region);
+    float x0, y0, x1, y1;
+    ASSERT_TRUE(region->GetRegion(x0, y0, x1, y1));
+    EXPECT_EQ(x0, 0.1f);
+    EXPECT_EQ(y1, 0.9f);
+    scene.reset(); // a deleted scene is no longer active
+    EXPECT_EQ(GetActiveScene(), nullptr);
+    EXPECT_FALSE(region->GetRegion(x0, y0, x1, y1));
 }

@@ -27,8 +27,9 @@ public:
 
     int Threads() const { return pool_.Size(); }
 
-    // Prepares the scene on the calling (main) thread: sends the changed-nodes notification
-    // (132) and the pre-render notification (57, with the RenderSettings), updates objects and
+    // Prepares the scene on the calling (main) thread: makes it the active scene, sends the
+    // changed-nodes notification (132) and the pre-render notification (57, with the
+    // RenderSettings), updates objects and
     // maps to the render time, and sets up the camera. Fails with a message when the settings
     // cannot be rendered.
     bool Prepare(Scene& scene, std::string& error);

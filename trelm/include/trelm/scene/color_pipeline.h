@@ -15,6 +15,10 @@
 
 namespace TrelmSDK {
 
+// Broadcast (parameter: the manager) when colour management is switched or the rendering space
+// changes.
+inline constexpr int NOTIFY_COLOR_MANAGEMENT_CHANGED = 272;
+
 // Converts colours from one space to another: decode the source transfer curve, change primaries,
 // encode the target curve. Immutable once made, so any thread may use it.
 class ColorConverter {
@@ -71,7 +75,7 @@ public:
     // linear for floating point.
     static std::string FileColorSpace(const std::string& declared, bool isFloat);
 
-    // Called on the main thread after a setting changed.
+    // Called on the main thread after a setting changed, before the notification is broadcast.
     void AddChangeListener(std::function<void()> fn) { listeners_.push_back(std::move(fn)); }
 
 private:

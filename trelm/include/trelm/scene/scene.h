@@ -18,7 +18,6 @@ namespace TrelmSDK {
 // Host notification codes sent about the scene, through BroadcastNotification on the main thread.
 inline constexpr int NOTIFY_PRE_RENDER = 57;     // parameter: the RenderSettings about to render
 inline constexpr int NOTIFY_NODES_CHANGED = 132; // parameter: a NodeChangeList
-inline constexpr int NOTIFY_COLOR_MANAGEMENT_CHANGED = 272;
 
 struct NodeChangeList {
     std::vector<INode*> nodes;
