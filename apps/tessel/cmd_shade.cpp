@@ -213,7 +213,6 @@ void registerClosures(ShadingSystem& ss) {
 
 struct OutputRequest {
     std::string symbol, file;
-    TypeDesc dataType = TypeDesc::FLOAT;
 };
 
 struct ShadeOptions {
@@ -226,6 +225,7 @@ struct ShadeOptions {
     std::string raytype = "camera";
     std::vector<OutputRequest> outputs;
     std::vector<std::string> entryLayers;
+    TypeDesc dataType = TypeDesc::FLOAT; // of every output image
 };
 
 // A --param value, typed as testshade types it: explicit ":type=", else int, float or string.
@@ -368,12 +368,11 @@ int runShade(const std::vector<std::string>& args) {
             i += 2;
         } else if (base == "-o") {
             if (!need(2)) break;
-            opt.outputs.push_back({args[i + 1], args[i + 2], TypeDesc::FLOAT});
+            opt.outputs.push_back({args[i + 1], args[i + 2]});
             i += 2;
         } else if (base == "-od" || base == "-d") {
             if (!need(1)) break;
-            TypeDesc t(args[i + 1].c_str());
-            for (OutputRequest& o : opt.outputs) o.dataType = t;
+            opt.dataType = TypeDesc(args[i + 1].c_str());
             ++i;
         } else if (base == "-t") {
             if (!need(1)) break;
@@ -520,7 +519,7 @@ int runShade(const std::vector<std::string>& args) {
             img.sym = nullptr;
             continue;
         }
-        OIIO::ImageSpec spec(opt.xres, opt.yres, img.channels, o.dataType);
+        OIIO::ImageSpec spec(opt.xres, opt.yres, img.channels, opt.dataType);
         img.buf = std::make_unique<OIIO::ImageBuf>(spec);
     }
     std::fflush(stdout);

@@ -53,6 +53,7 @@ struct Mod {
 struct Pow {
     static float v(float x, float y) { return OIIO::fast_safe_pow(x, y); }
     static D2 d(const D2& a, const D2& b) {
+        if (a.val() == 0.0f) return D2(0.0f);
         const float r = v(a.val(), b.val());
         const float da = a.val() == 0.0f ? 0.0f : b.val() * v(a.val(), b.val() - 1.0f);
         const float db = a.val() > 0.0f ? r * OIIO::fast_log(a.val()) : 0.0f;
@@ -65,13 +66,15 @@ struct Pow {
 };
 struct Atan2 {
     static float v(float y, float x) { return OIIO::fast_atan2(y, x); }
+    // The derivative terms are combined as the reference combines them (its sign included),
+    // so that shaders see the same values.
     static D2 d(const D2& y, const D2& x) {
         const float denom = x.val() * x.val() + y.val() * y.val();
         D2 r;
         r.val() = v(y.val(), x.val());
         if (denom != 0.0f) {
-            r.dx() = (y.dx() * x.val() - x.dx() * y.val()) / denom;
-            r.dy() = (y.dy() * x.val() - x.dy() * y.val()) / denom;
+            r.dx() = (y.val() * x.dx() - x.val() * y.dx()) / denom;
+            r.dy() = (y.val() * x.dy() - x.val() * y.dy()) / denom;
         }
         return r;
     }

@@ -101,7 +101,8 @@ public:
             if (hintBody(h, "%filename", body)) {
                 m_file = ustring(unquote(body));
             } else if (hintBody(h, "%line", body)) {
-                op.line = std::atoi(body.c_str());
+                m_line = std::atoi(body.c_str());
+                op.line = m_line;
             } else if (hintBody(h, "%argrw", body)) {
                 body = unquote(body);
                 for (size_t i = 0; i < body.size() && i < 32; ++i)
@@ -152,6 +153,7 @@ public:
         MasterOp op;
         op.opname = ustring(opcode);
         op.firstArg = int(m_master.args.size());
+        op.line = m_line; // ops without a %line hint continue the previous line
         m_master.ops.push_back(op);
         m_inOp = true;
         m_jumps = 0;
@@ -214,6 +216,7 @@ private:
     ustring m_section;
     int m_sectionBegin = 0;
     ustring m_file;
+    int m_line = 0;
 };
 
 } // namespace
