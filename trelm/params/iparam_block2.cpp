@@ -519,6 +519,27 @@ ReferenceTarget* IParamBlock2::GetReferenceTarget(ParamID id, TimeValue t, int t
     return ReadOr<ReferenceTarget*>(*this, id, t, tabIndex, nullptr);
 }
 
+bool IParamBlock2::GetStoredValue(ParamID id, int tabIndex, PB2Value& v) const {
+    const Param* p = Locate(id, tabIndex, "GetStoredValue");
+    if (!p) return false;
+    v = p->elements[tabIndex].value;
+    return true;
+}
+
+bool IParamBlock2::StoreValue(ParamID id, int tabIndex, const PB2Value& v) {
+    Param* p = Locate(id, tabIndex, "StoreValue");
+    if (!p) return false;
+    PB2Value value = CoerceValue(v, p->type);
+    if (value.IsEmpty() || HoldsReference(p->type)) {
+        ReportSDKError(L"IParamBlock2 '" + desc_->InternalName() + L"' StoreValue: parameter " +
+                       std::to_wstring(id) +
+                       L" cannot store this value (maps are stored through references)");
+        return false;
+    }
+    p->elements[tabIndex].value = std::move(value);
+    return true;
+}
+
 // ---- tables -----------------------------------------------------------------------------------
 
 int IParamBlock2::Count(ParamID id) const {

@@ -1,5 +1,7 @@
 #include "params_test_objects.h"
 
+#include <trelm/params/keyframe_control.h>
+
 #include <gtest/gtest.h>
 
 #include <memory>
@@ -312,4 +314,36 @@ TEST_F(ParamBlockTest, ResetReturnsToDefaults) {
     EXPECT_EQ(ui.calls, calls + 1);
     EXPECT_EQ(ui.lastId, -1);
     pb->RemoveMap(&ui);
+}
+
+TEST_F(ParamBlockTest, StoredValuesBypassControllersAccessorsAndUndo) {
+    struct Plus : PBAccessor {
+        void Get(PB2Value& v, ReferenceMaker*, ParamID, int, TimeValue, Interval&) override {
+            v = PB2Value(v.Get<float>() + 100);
+        }
+    } plus;
+    ParamBlockDesc2 d(3, L"stored", 0, nullptr, 0, 0, L"V", TYPE_FLOAT, P_ANIMATABLE, 0, p_accessor,
+                      &plus, p_end, 1, L"M", TYPE_TEXMAP, 0, 0, p_end, p_end);
+    IParamBlock2* block = CreateParameterBlock2(&d, nullptr);
+    theHold.Begin();
+    ASSERT_TRUE(block->StoreValue(0, 0, 2));
+    theHold.Accept(L"load");
+    EXPECT_EQ(theHold.NumUndoSteps(), 0) << "loading is not an undoable change";
+    PB2Value v;
+    ASSERT_TRUE(block->GetStoredValue(0, 0, v));
+    EXPECT_EQ(v.Get<float>(), 2.0f) << "converted to the parameter's storage kind";
+    EXPECT_EQ(block->GetFloat(0), 102.0f) << "reads still pass the accessor";
+
+    auto* keys = new LinearFloatControl();
+    keys->SetKey(0, 7.0f);
+    block->SetController(0, 0, keys);
+    ASSERT_TRUE(block->GetStoredValue(0, 0, v));
+    EXPECT_EQ(v.Get<float>(), 2.0f) << "the controller does not change the stored value";
+
+    ErrorCapture capture;
+    EXPECT_FALSE(block->StoreValue(0, 0, L"text"));
+    EXPECT_FALSE(block->StoreValue(1, 0, static_cast<ReferenceTarget*>(nullptr)));
+    EXPECT_FALSE(block->GetStoredValue(0, 4, v));
+    EXPECT_EQ(capture.errors.size(), 3u);
+    block->DeleteMe();
 }

@@ -91,6 +91,11 @@ public:
     Texmap* GetTexmap(ParamID id, TimeValue t = 0, int tabIndex = 0);
     ReferenceTarget* GetReferenceTarget(ParamID id, TimeValue t = 0, int tabIndex = 0);
 
+    // The element's own stored value, bypassing its controller and the accessor: what a scene file
+    // saves. StoreValue writes one back while loading: no accessor, undo record or notification.
+    bool GetStoredValue(ParamID id, int tabIndex, PB2Value& v) const;
+    bool StoreValue(ParamID id, int tabIndex, const PB2Value& v);
+
     // Tables. Count is 1 for a parameter that is not a table, -1 for an unknown ID. SetCount
     // keeps the first elements, fills new ones with the default and releases the maps and
     // controllers of dropped ones; undoable.
