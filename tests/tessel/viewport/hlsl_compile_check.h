@@ -95,8 +95,6 @@ inline std::string WrapInComputeShader(const std::vector<GeneratedFunction>& fun
                 includes.push_back(entry);
         texts += function.text + "\n";
     }
-    std::string shader = TrelmSDK::Graphics::ksg::AssembleLibraryEntry(includes, texts, error);
-    if (shader.empty()) return {};
     std::ostringstream main;
     std::ostringstream globals;
     std::vector<std::string> infos;
@@ -123,7 +121,11 @@ inline std::string WrapInComputeShader(const std::vector<GeneratedFunction>& fun
         }
         main << "        " << function.name << "(" << arguments << ");\n    }\n";
     }
-    shader += "\n" + globals.str() + "RWStructuredBuffer<float4> ksg_test_result;\n" +
+    // Sampler companions (S_info) are globals that the functions read.
+    std::string shader =
+        TrelmSDK::Graphics::ksg::AssembleLibraryEntry(includes, globals.str() + texts, error);
+    if (shader.empty()) return {};
+    shader += std::string("\nRWStructuredBuffer<float4> ksg_test_result;\n") +
               "[numthreads(1, 1, 1)]\nvoid main()\n{\n" + main.str() +
               "    ksg_test_result[0] = float4(0, 0, 0, 1);\n}\n";
     return shader;
