@@ -117,6 +117,19 @@ public:
     bool get_matrix(ShaderGlobals* sg, Matrix44& result, ustring from) override {
         return get_matrix(sg, result, from, 0.0f);
     }
+    // Geometry data of the grid: "s" and "t" follow u and v.
+    bool get_userdata(bool derivatives, ustring name, TypeDesc type, ShaderGlobals* sg,
+                      void* val) override {
+        if (type != TypeFloat || (name != "s" && name != "t")) return false;
+        float* out = static_cast<float*>(val);
+        const bool isS = name == "s";
+        out[0] = isS ? sg->u : sg->v;
+        if (derivatives) {
+            out[1] = isS ? sg->dudx : sg->dvdx;
+            out[2] = isS ? sg->dudy : sg->dvdy;
+        }
+        return true;
+    }
     const Matrix44* shaderMatrix() const { return &m_shader; }
     const Matrix44* objectMatrix() const { return &m_object; }
 

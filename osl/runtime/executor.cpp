@@ -124,6 +124,13 @@ void runLayer(ExecState& st, int layer) {
     const ProgramLayer& pl = st.prog->layers[layer];
     std::memcpy(st.heap + pl.regionBegin, st.prog->initImage.data() + pl.regionBegin,
                 pl.regionEnd - pl.regionBegin);
+    if (!pl.userdata.empty()) {
+        RendererServices* rs = ctx.system->renderer;
+        for (const UserdataParam& u : pl.userdata)
+            if (rs && !rs->get_userdata(u.value.derivs, u.name, u.value.type, st.sg, st.p(u.value)))
+                std::memcpy(st.p(u.value), st.prog->initImage.data() + u.value.offset,
+                            u.value.size * (u.value.derivs ? 3 : 1));
+    }
     const uint8_t savedStatus = ctx.status;
     const int savedLayer = ctx.currentLayer;
     ctx.currentLayer = layer;

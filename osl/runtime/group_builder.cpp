@@ -34,7 +34,8 @@ bool typesConnectable(const TypeSpec& src, const TypeSpec& dst) {
     if (src.is_structure_based() || dst.is_structure_based()) return false;
     const TypeDesc s = src.simpletype(), d = dst.simpletype();
     if (s.basetype == TypeDesc::STRING || d.basetype == TypeDesc::STRING) return s == d;
-    if (s.arraylen != d.arraylen) return false;
+    // An unsized array input takes the length of the array connected to it.
+    if (s.arraylen != d.arraylen && !(d.arraylen < 0 && s.arraylen > 0)) return false;
     if (s.aggregate == d.aggregate) return true;
     // A single number feeds every component of a triple.
     return s.aggregate == TypeDesc::SCALAR && d.aggregate == TypeDesc::VEC3;

@@ -4,6 +4,7 @@
 
 #include <OpenImageIO/strutil.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
@@ -21,31 +22,35 @@ void kFormat(ExecState& st, const Instr& in) {
     oslFormat(st, *st.s(in.args[1]), in.args + 2, in.nargs - 2, buf);
     *st.s(in.args[0]) = ustring(buf);
 }
-void kError(ExecState& st, const Instr& in) {
+// error() and warning() text goes to the error handler with the shader's name; with
+// error_repeats off, a context reports each distinct message once.
+void reportFromShader(ExecState& st, const Instr& in, bool isError) {
     std::string& buf = st.ctx->scratch;
     buf.clear();
     oslFormat(st, *st.s(in.args[0]), in.args + 1, in.nargs - 1, buf);
-    if (!buf.empty() && buf.back() == '\n') buf.pop_back();
     ShadingContext& ctx = *st.ctx;
+    const std::string msg = std::string(isError ? "Shader error [" : "Shader warning [") +
+                            st.prog->group->layers[size_t(in.layer)].master->name.string() +
+                            "]: " + buf;
+    if (!ctx.system->errorRepeats) {
+        if (std::find(ctx.errorsSeen.begin(), ctx.errorsSeen.end(), msg) != ctx.errorsSeen.end())
+            return;
+        ctx.errorsSeen.push_back(msg);
+    }
     if (!ctx.output.empty()) {
         ctx.system->message(ctx.output);
         ctx.output.clear();
     }
-    ctx.system->error("Shader error [" + st.prog->group->layers[in.layer].master->name.string() +
-                      "]: " + buf);
+    if (isError)
+        ctx.system->error(msg);
+    else
+        ctx.system->warning(msg);
+}
+void kError(ExecState& st, const Instr& in) {
+    reportFromShader(st, in, true);
 }
 void kWarning(ExecState& st, const Instr& in) {
-    std::string& buf = st.ctx->scratch;
-    buf.clear();
-    oslFormat(st, *st.s(in.args[0]), in.args + 1, in.nargs - 1, buf);
-    if (!buf.empty() && buf.back() == '\n') buf.pop_back();
-    ShadingContext& ctx = *st.ctx;
-    if (!ctx.output.empty()) {
-        ctx.system->message(ctx.output);
-        ctx.output.clear();
-    }
-    ctx.system->warning("Shader warning [" +
-                        st.prog->group->layers[in.layer].master->name.string() + "]: " + buf);
+    reportFromShader(st, in, false);
 }
 void kFprintf(ExecState& st, const Instr& in) {
     std::string text;

@@ -75,8 +75,16 @@ public:
     uint64_t programSerial = 0; // storage is valid only in a context bound to this program
 };
 
+// A parameter whose value comes from the geometry (lockgeom=0): asked of the renderer's
+// get_userdata each time the layer runs, keeping the default when the renderer has none.
+struct UserdataParam {
+    ustring name;
+    Operand value;
+};
+
 struct ProgramLayer {
     ustring name;
+    std::vector<UserdataParam> userdata;
     int mainBegin = 0, mainEnd = 0;
     std::vector<std::pair<int, int>> initRanges; // param init code to run at layer start
     uint32_t regionBegin = 0, regionEnd = 0;     // bytes of the heap reset at layer start

@@ -219,7 +219,15 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
         const MasterSymbol& ms = inst.master->symbols[s];
         TypeDesc t = ms.type.is_closure_based() ? TypeDesc(TypeDesc::PTR, ms.type.arraylength())
                                                 : ms.type.simpletype();
-        if (t.arraylen < 0) t.arraylen = arrayLengthOf(ms, inst.valueFor(s));
+        if (t.arraylen < 0) {
+            t.arraylen = arrayLengthOf(ms, inst.valueFor(s));
+            for (int c : connectedTo[l]) {
+                const Connection& cn = group.connections[c];
+                if (cn.dst.symbol == s && cn.dst.arrayIndex < 0 &&
+                    symType[cn.src.layer][cn.src.symbol].arraylen > 0 && cn.src.arrayIndex < 0)
+                    t.arraylen = symType[cn.src.layer][cn.src.symbol].arraylen;
+            }
+        }
         symType[l][s] = t;
         at = align8(at);
         place[l][s] = {at, true};
@@ -297,6 +305,14 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
             if (ms.isParam() && ms.initBegin >= 0 && !inst.valueFor(int(s)) &&
                 !isConnectedParam(l, int(s)))
                 prog->layers[l].initRanges.emplace_back(ms.initBegin, ms.initEnd);
+            const InstanceValue* iv = inst.valueFor(int(s));
+            const bool geometric = iv ? !iv->lockgeom : !ms.lockgeom;
+            if (ms.isParam() && geometric && !ms.isStruct() && place[l][s].storage &&
+                !isConnectedParam(l, int(s))) {
+                const ShaderSymbol& sym = prog->symbols[size_t(symIndex[l][s])];
+                prog->layers[l].userdata.push_back(
+                    {ms.name, makeOperand(sym.type, sym.offset, sym.derivs)});
+            }
         }
     }
 

@@ -365,8 +365,8 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
             if (!cur.empty()) tok.push_back(cur);
         }
         if (tok.empty()) continue;
-        if (tok[0] == "shader" && tok.size() >= 3) {
-            ok &= Shader(*g, "surface", tok[1], tok[2]);
+        if (tok[0] == "shader" && tok.size() >= 2) {
+            ok &= Shader(*g, "surface", tok[1], tok.size() >= 3 ? tok[2] : tok[1]);
         } else if (tok[0] == "connect" && tok.size() >= 3) {
             const size_t a = tok[1].find('.'), b = tok[2].find('.');
             if (a == std::string::npos || b == std::string::npos) {
