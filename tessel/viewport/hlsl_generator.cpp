@@ -200,7 +200,7 @@ bool GenerateBody(const OSOData& oso, std::string& body, HLSLGenGlobals& globals
 
     for (const auto& [sectionName, section] : oso.sections) {
         if (!IsKind(oso, sectionName, kParam)) continue;
-        const std::string flag = "if(UseDefault_" + HLSLName(sectionName) + ")";
+        const std::string flag = std::string("if(UseDefault_") + HLSLName(sectionName) + ")";
         WriteLine(out, depth, flag);
         WriteLine(out, depth, "{");
         if (!GenerateSection(section, oso, depth + 1, globals, out, info)) return false;
@@ -235,7 +235,7 @@ std::string GenerateSignature(const OSOData& oso, const std::string& name,
         if (symbol.symtype != kParam || symbol.type.structure() != 0) continue;
         std::string entry =
             HLSLTypeName(symbol.type.elementtype(), globals) + " " + HLSLName(symbol.name);
-        if (symbol.type.is_array()) entry += "[" + ArrayLength(symbol.type) + "]";
+        if (symbol.type.is_array()) entry += std::string("[") + ArrayLength(symbol.type) + "]";
         // An HLSL function cannot take an array whose length is only known at run time.
         if (symbol.type.is_unsized_array()) {
             RecordMessage(globals.info, "Unsupported type");
@@ -245,7 +245,7 @@ std::string GenerateSignature(const OSOData& oso, const std::string& name,
     }
     for (const auto& section : oso.sections)
         if (IsKind(oso, section.first, kParam))
-            entries.push_back("int UseDefault_" + HLSLName(section.first));
+            entries.push_back(std::string("int UseDefault_") + HLSLName(section.first));
     const auto addInputs = [&](auto&& wanted) {
         for (const auto& [type, input] : globals.additionalInputs)
             if (wanted(type)) entries.push_back(type + " " + input);
@@ -258,9 +258,9 @@ std::string GenerateSignature(const OSOData& oso, const std::string& name,
     });
     for (const OSOSymbol& symbol : oso.symbolList) {
         if (symbol.symtype != kOutputParam || symbol.type.structure() != 0) continue;
-        std::string entry =
-            "out " + HLSLTypeName(symbol.type.elementtype(), globals) + " " + HLSLName(symbol.name);
-        if (symbol.type.is_array()) entry += "[" + ArrayLength(symbol.type) + "]";
+        std::string entry = std::string("out ") + HLSLTypeName(symbol.type.elementtype(), globals) +
+                            " " + HLSLName(symbol.name);
+        if (symbol.type.is_array()) entry += std::string("[") + ArrayLength(symbol.type) + "]";
         entries.push_back(entry);
         if (symbol.type.is_string()) {
             RecordUnsupported(globals.info, "Dynamic string outputs (per object) not supported");

@@ -4,6 +4,7 @@
 #include "hlsl_gen_globals.h"
 #include "hlsl_names.h"
 
+#include <algorithm>
 #include <string>
 
 namespace oslo {
@@ -41,7 +42,9 @@ inline bool IsScalarArg(const OpConverterParams& p, size_t i) {
 // A line break followed by the indentation of the current depth plus extra levels, for
 // converters whose text spans several lines.
 inline std::string NewLine(const OpConverterParams& p, int extra = 0) {
-    return "\n" + std::string(static_cast<size_t>(std::max(0, p.depth + extra)), '\t');
+    std::string text = "\n";
+    text.append(static_cast<size_t>(std::max(0, p.depth + extra)), '\t');
+    return text;
 }
 
 } // namespace oslo

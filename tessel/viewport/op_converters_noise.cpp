@@ -26,8 +26,8 @@ NoiseCall MakeNoiseCall(OpConverterParams& p, size_t positionArg) {
     const int n = (IsFloatOrInt(ArgSymbol(p, positionArg)) ? 1 : 3) + (hasTime ? 1 : 0);
     NoiseCall call;
     call.resultWidth = d;
-    call.suffix = "_" + std::to_string(d) + "_" + std::to_string(n);
-    call.argument = "(float" + std::to_string(n) + "(" + Arg(p, positionArg);
+    call.suffix = std::string("_") + std::to_string(d) + "_" + std::to_string(n);
+    call.argument = std::string("(float") + std::to_string(n) + "(" + Arg(p, positionArg);
     if (hasTime) call.argument += ", " + Arg(p, positionArg + 1);
     call.argument += ")";
     return call;
@@ -61,7 +61,8 @@ bool ConvertNoise(OpConverterParams& p) {
         RecordUnsupported(p.info, "Gabor noise not supported - will be approximated.");
     const std::string type = Arg(p, 1);
     const NoiseCall call = MakeNoiseCall(p, 2);
-    const std::string half = ") + (float" + std::to_string(call.resultWidth) + ")0.5;}";
+    const std::string half =
+        std::string(") + (float") + std::to_string(call.resultWidth) + ")0.5;}";
     const auto test = [&](const char* noise) { return HashText(noise) + " == " + type; };
     const std::string next = NewLine(p) + "else if(";
     p.out << "if(" << test("cell") << ") {" << r << " = cellnoise" << call.suffix << call.argument
