@@ -285,12 +285,12 @@ std::string serializeGroup(const ShaderGroup& g) {
     }
     for (const Connection& c : g.connections) {
         auto name = [&](const ConnectedPart& p) {
-            std::string s =
-                g.layers[size_t(p.layer)].layername.string() + "." +
-                g.layers[size_t(p.layer)].master->symbols[size_t(p.symbol)].name.string();
-            if (p.arrayIndex >= 0) s += "[" + std::to_string(p.arrayIndex) + "]";
-            if (p.component >= 0) s += "[" + std::to_string(p.component) + "]";
-            return s;
+            std::ostringstream s;
+            s << g.layers[size_t(p.layer)].layername.string() << '.'
+              << g.layers[size_t(p.layer)].master->symbols[size_t(p.symbol)].name.string();
+            if (p.arrayIndex >= 0) s << '[' << p.arrayIndex << ']';
+            if (p.component >= 0) s << '[' << p.component << ']';
+            return s.str();
         };
         out << "connect " << name(c.src) << " " << name(c.dst) << " ;\n";
     }

@@ -53,9 +53,8 @@ struct Mod {
 struct Pow {
     static float v(float x, float y) { return OIIO::fast_safe_pow(x, y); }
     static D2 d(const D2& a, const D2& b) {
-        if (a.val() == 0.0f) return D2(0.0f);
-        const float r = v(a.val(), b.val());
-        const float da = a.val() == 0.0f ? 0.0f : b.val() * v(a.val(), b.val() - 1.0f);
+        const float r = a.val() == 0.0f ? 0.0f : v(a.val(), b.val());
+        const float da = b.val() * v(a.val(), b.val() - 1.0f);
         const float db = a.val() > 0.0f ? r * OIIO::fast_log(a.val()) : 0.0f;
         D2 out;
         out.val() = r;
