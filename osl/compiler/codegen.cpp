@@ -242,6 +242,8 @@ void CodeGen::declareFunction(const Node* n) {
     fn->file = fileOf(n);
     fn->line = n->line;
     fn->builtin = !n->body;
+    // A closure declared without a body is a renderer closure: it takes keyword arguments too.
+    if (fn->builtin && fn->ret.is_closure()) fn->isClosure = fn->variadic = true;
     for (const auto& m : n->metadata) {
         const Node* v = m->kid(0);
         if (m->name == "op" && v && v->kind == NodeKind::StringLit) fn->opname = v->stringValue;
@@ -265,6 +267,10 @@ void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
     const Node* n = fn->decl;
     std::vector<Op> scratch;
     auto* savedOps = m_ops;
+    bool savedCheck = m_checkOnly;
+    FunctionSymbol* savedFn = m_currentFunction;
+    bool savedReturn = m_sawReturn;
+    int savedFile = m_curFile, savedLine = m_curLine;
     m_ops = &scratch;
     m_checkOnly = true;
     pushScope();
@@ -283,10 +289,13 @@ void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
     m_inline.pop_back();
     if (!fn->ret.is_void() && !m_sawReturn)
         error(n->body.get(), "non-void function \"" + fn->name + "\" had no 'return' statement.");
-    m_currentFunction = nullptr;
+    m_currentFunction = savedFn;
+    m_sawReturn = savedReturn;
     popScope();
-    m_checkOnly = false;
+    m_checkOnly = savedCheck;
     m_ops = savedOps;
+    m_curFile = savedFile;
+    m_curLine = savedLine;
 }
 
 bool CodeGen::run(const std::vector<NodePtr>& decls, ShaderUnit& out) {
@@ -690,7 +699,7 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
                 TypeSpec ft = spec->field(int(i)).type;
                 Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
                 Symbol* f = var->fields[i];
-                if (!assignable(ft, val->type) && !(ft.is_closure() && val->isConst())) {
+                if (!assignCompatible(ft, val->type) && !(ft.is_closure() && val->isConst())) {
                     error(k, "Can't assign '" + val->type.string() + "' to '" + ft.string() + " " +
                                  spec->name().string() + "." + spec->field(int(i)).name.string() +
                                  "'");
@@ -723,7 +732,7 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
     } else if (t.is_int() && val->type.is_float()) {
         warning(at, "Assignment may lose precision: " + t.string() + " " + at->name + " = " +
                         val->type.string());
-    } else if (!assignable(t, val->type) && !(t.is_int() && val->type.is_float())) {
+    } else if (!assignCompatible(t, val->type) && !(t.is_int() && val->type.is_float())) {
         if (!(t.is_array() && val->type.is_array() &&
               equivalent(t.elementtype(), val->type.elementtype()))) {
             error(at, std::string(isDecl ? "Cannot initialize " : "Cannot assign ") + t.string() +
@@ -736,11 +745,11 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
 
 void CodeGen::ifStatement(const Node* s) {
     Symbol* cond = expr(s->kid(0));
-    if (cond->type.is_structure_based() || cond->type.is_closure_based())
+    if (cond->type.is_structure_based() || cond->type.is_array())
         error(s, "Cannot use a " + cond->type.string() + " as a condition");
     m_curLine = s->line;
     m_curFile = s->file;
-    if (!cond->type.is_int()) {
+    if (!cond->type.is_int() && !cond->type.is_closure()) {
         Symbol* t = temp(TypeSpec(TypeDesc::TypeInt));
         emit("neq", {t, cond, constInt(0)});
         cond = t;
@@ -798,24 +807,28 @@ void CodeGen::returnStatement(const Node* s) {
         emit("exit", {}, "");
         return;
     }
-    InlineFrame& f = m_inline.back();
+    size_t fi = m_inline.size() - 1;
     m_sawReturn = true;
     if (s->kid(0)) {
-        if (!f.result) {
+        if (!m_inline[fi].result) {
             error(s, "Cannot return a value from a void function");
             return;
         }
-        Symbol* v = expr(s->kid(0), &f.fn->ret);
-        if (!assignable(f.fn->ret, v->type) && !equivalent(f.fn->ret, v->type)) {
+        TypeSpec rt = m_inline[fi].fn->ret;
+        Symbol* v = expr(s->kid(0), &rt);
+        InlineFrame& f = m_inline[fi];
+        if (!assignCompatible(f.fn->ret, v->type)) {
             error(s, "Cannot return a '" + v->type.string() + "' from '" + f.fn->ret.string() +
                          " " + f.fn->name + "()'");
             return;
         }
         assignInto(f.result, v, s);
-    } else if (f.result) {
-        error(s, "You must return a '" + f.fn->ret.string() + "' from '" + f.fn->name + "()'");
+    } else if (m_inline[fi].result) {
+        error(s, "You must return a '" + m_inline[fi].fn->ret.string() + "' from '" +
+                     m_inline[fi].fn->name + "()'");
     }
-    f.returnOps.push_back(emit("return", {}, ""));
+    int op = emit("return", {}, "");
+    m_inline[fi].returnOps.push_back(op);
 }
 
 } // namespace OSL::pvt

@@ -16,6 +16,10 @@ namespace OSL::pvt {
 std::string formatFloat(float f);
 std::string quoteString(const std::string& s);
 
+// Whether a value of type src may be stored in dst: OSL's assignability, plus any triple into
+// any triple (color from point and the like).
+bool assignCompatible(const TypeSpec& dst, const TypeSpec& src);
+
 class CodeGen {
 public:
     CodeGen(Diagnostics& diag, const std::vector<std::string>& files);
@@ -109,7 +113,11 @@ private:
     void store(const LRef& r, Symbol* value, const Node* at);
     Symbol* convert(Symbol* v, const TypeSpec& to, const Node* at);
     void assignInto(Symbol* dst, Symbol* src, const Node* at);
-    void checkWritable(Symbol* s, const Node* at, const std::string& context = "");
+    void checkWritable(Symbol* s, const Node* at, const std::string& context = "",
+                       bool plainAssign = false);
+    Symbol* voidValue();
+    Symbol* operatorCall(const std::string& opname, const std::vector<Symbol*>& args,
+                         const Node* at);
     Symbol* inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
                        std::vector<LRef>& argRefs);
     FunctionSymbol* resolveOverload(const std::string& name, const std::vector<TypeSpec>& argTypes,
@@ -138,6 +146,8 @@ private:
     int m_silent = 0; // >0 while re-walking code already checked (inlining)
     bool m_checkOnly = false;
     std::set<std::string> m_nonWritableGlobals;
+    std::set<const Node*> m_declaredFunctions;
+    Symbol* m_void = nullptr; // the value of a void call
     FunctionSymbol* m_currentFunction = nullptr;
     bool m_sawReturn = false;
 };

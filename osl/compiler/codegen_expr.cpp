@@ -26,6 +26,17 @@ int componentIndex(const TypeSpec& t, const std::string& name) {
 }
 } // namespace
 
+bool assignCompatible(const TypeSpec& dst, const TypeSpec& src) {
+    if (assignable(dst, src) || equivalent(dst, src)) return true;
+    if (dst.is_triple() && src.is_triple()) return true;
+    if (dst.is_array() && src.is_array() && !dst.is_closure_based() && !src.is_closure_based()) {
+        TypeSpec a = dst.elementtype(), b = src.elementtype();
+        return (a == b || (a.is_triple() && b.is_triple())) &&
+               (dst.arraylength() == src.arraylength() || dst.is_unsized_array());
+    }
+    return false;
+}
+
 Symbol* CodeGen::expr(const Node* e, const TypeSpec* expected) {
     if (!e) return temp(kFloat);
     if (e->kind != NodeKind::Empty) m_curLine = e->line, m_curFile = e->file;
@@ -135,11 +146,14 @@ void CodeGen::assignInto(Symbol* dst, Symbol* src, const Node* at) {
     emit("assign", {dst, src});
 }
 
-void CodeGen::checkWritable(Symbol* s, const Node* at, const std::string& context) {
+void CodeGen::checkWritable(Symbol* s, const Node* at, const std::string& context,
+                            bool plainAssign) {
     Symbol* root = s;
     while (root->structParent) root = root->structParent;
     bool funcParam = root->symtype == SymTypeParam && m_currentFunction;
-    bool global = root->symtype == SymTypeGlobal && m_nonWritableGlobals.count(root->name);
+    // Like the reference compiler, only a plain `=` into a read-only global is refused.
+    bool global =
+        plainAssign && root->symtype == SymTypeGlobal && m_nonWritableGlobals.count(root->name);
     if (funcParam || global)
         error(at, "cannot write to non-output parameter \"" + root->name + "\"" + context);
     if (root->isConst()) error(at, "cannot write to a constant");
@@ -218,7 +232,8 @@ CodeGen::LRef CodeGen::lvalue(const Node* e, bool forWrite) {
             r.type = TypeSpec(); // a matrix row: only usable with a second index
             return r;
         }
-        if (b.sym && b.sym->type.is_matrix() && b.comp && !b.comp2 && b.type.is_unknown()) {
+        if (b.sym && b.sym->type.elementtype().is_matrix() && b.comp && !b.comp2 &&
+            b.type.is_unknown()) {
             r = b;
             r.comp2 = idx;
             r.type = kFloat;
@@ -239,7 +254,7 @@ CodeGen::LRef CodeGen::lvalue(const Node* e, bool forWrite) {
 
 Symbol* CodeGen::load(const LRef& r, const Node* at) {
     if (!r.sym) return temp(kFloat);
-    if (r.sym->type.is_matrix() && r.comp && !r.comp2) {
+    if (r.sym->type.elementtype().is_matrix() && r.comp && !r.comp2) {
         error(at, "indexing into non-array or non-component type");
         return temp(kFloat);
     }
@@ -280,7 +295,7 @@ Symbol* CodeGen::load(const LRef& r, const Node* at) {
 void CodeGen::store(const LRef& r, Symbol* value, const Node* at) {
     if (!r.sym) return;
     checkWritable(r.sym, at);
-    if (r.sym->type.is_matrix() && r.comp && !r.comp2) {
+    if (r.sym->type.elementtype().is_matrix() && r.comp && !r.comp2) {
         error(at, "indexing into non-array or non-component type");
         return;
     }
@@ -380,6 +395,13 @@ Symbol* CodeGen::binary(const Node* e) {
     Symbol* b = expr(e->kid(1));
     m_curLine = e->line;
     m_curFile = e->file;
+    static const std::map<std::string, std::string> overloadNames = {
+        {"+", "add"},   {"-", "sub"}, {"*", "mul"},  {"/", "div"}, {"%", "mod"}, {"==", "eq"},
+        {"!=", "ne"},   {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
+        {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
+    // A user-defined operator wins over the built-in meaning.
+    if (Symbol* r = operatorCall("__operator__" + overloadNames.at(e->op) + "__", {a, b}, e))
+        return r;
     bool ok = true;
     TypeSpec rt = arithmeticResult(e->op, a->type, b->type, ok);
     if (!ok) {
@@ -438,6 +460,10 @@ Symbol* CodeGen::unary(const Node* e) {
     Symbol* a = expr(k);
     m_curLine = e->line;
     if (e->op == "+") return a;
+    const char* overload = e->op == "-"   ? "__operator__neg__"
+                           : e->op == "~" ? "__operator__compl__"
+                                          : "__operator__not__";
+    if (Symbol* r = operatorCall(overload, {a}, e)) return r;
     if (a->type.is_structure_based() || a->type.is_array() || a->type.is_string()) {
         error(e, "Can't do '" + e->op + "' to a " + a->type.string());
         return temp(a->type);
@@ -506,12 +532,11 @@ Symbol* CodeGen::assign(const Node* e) {
         } else if (t.is_int() && v->type.is_float()) {
             warning(e, "Assignment may lose precision: " + t.string() + " " + lhsName + " = " +
                            v->type.string());
-        } else if (!t.is_unknown() && !v->type.is_unknown() && !assignable(t, v->type) &&
-                   !(t.is_array() && v->type.is_array() &&
-                     equivalent(t.elementtype(), v->type.elementtype()))) {
+        } else if (!t.is_unknown() && !v->type.is_unknown() && !assignCompatible(t, v->type)) {
             error(e, "Cannot assign " + t.string() + " " + lhsName + " = " + v->type.string());
             return v;
         }
+        checkWritable(r.sym, e, "", true);
         store(r, v, e);
         return v;
     }
@@ -553,7 +578,7 @@ Symbol* CodeGen::ternary(const Node* e) {
     assignInto(r, a, e);
     int elseStart = nextOp();
     Symbol* b = expr(e->kid(2), &a->type);
-    if (!assignable(r->type, b->type) && !equivalent(r->type, b->type))
+    if (!assignCompatible(r->type, b->type))
         error(e, "Incompatible types in ?: expression: " + a->type.string() + " and " +
                      b->type.string());
     assignInto(r, b, e);
@@ -636,7 +661,7 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
             const Node* k = e->kid(i);
             TypeSpec ft = spec->field(int(i)).type;
             Symbol* v = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
-            if (!assignable(ft, v->type) && !equivalent(ft, v->type)) {
+            if (!assignCompatible(ft, v->type)) {
                 error(k, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " +
                              spec->name().string() + "." + spec->field(int(i)).name.string() + "'");
                 continue;
@@ -648,12 +673,16 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
     if (t.is_triple() || t.is_matrix()) {
         // `{a, b, c}` for a triple reads as its constructor.
         std::vector<Symbol*> args;
-        for (const auto& k : e->kids) args.push_back(convert(expr(k.get()), kFloat, k.get()));
+        for (const auto& k : e->kids) {
+            Symbol* a = expr(k.get());
+            args.push_back(a->type.is_string() ? a : convert(a, kFloat, k.get()));
+        }
         size_t want = t.is_matrix() ? 16 : 3;
         Symbol* r = temp(t);
+        bool space = args.size() == want + 1 && args[0]->type.is_string();
         if (args.size() == 1) {
             emit("assign", {r, args[0]});
-        } else if (args.size() == want) {
+        } else if (args.size() == want || space) {
             args.insert(args.begin(), r);
             emit(t.string(), args);
         } else {
@@ -807,7 +836,7 @@ Symbol* CodeGen::structCtor(const Node* e, int structId) {
     for (size_t i = 0; i < e->kids.size() && int(i) < spec->numfields(); ++i) {
         TypeSpec ft = spec->field(int(i)).type;
         Symbol* v = expr(e->kid(i), &ft);
-        if (!assignable(ft, v->type) && !equivalent(ft, v->type)) {
+        if (!assignCompatible(ft, v->type)) {
             error(e, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " + e->name +
                          "." + spec->field(int(i)).name.string() + "'");
             continue;
@@ -916,7 +945,30 @@ Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symb
     m_curLine = e->line;
     emit(fn->isClosure ? "closure" : fn->opname.empty() ? fn->name : fn->opname, opargs, rw);
     for (auto& wb : writeBacks) store(refs[wb.first], wb.second, e);
-    return result ? result : temp(TypeSpec(TypeDesc(TypeDesc::NONE)));
+    return result ? result : voidValue();
+}
+
+Symbol* CodeGen::voidValue() {
+    if (!m_void) {
+        m_pool.push_back(std::make_unique<Symbol>());
+        m_void = m_pool.back().get();
+        m_void->type = TypeSpec(TypeDesc(TypeDesc::NONE));
+        m_void->name = "$void";
+    }
+    return m_void;
+}
+
+Symbol* CodeGen::operatorCall(const std::string& opname, const std::vector<Symbol*>& args,
+                              const Node* at) {
+    if (!m_functions.count(opname)) return nullptr;
+    std::vector<TypeSpec> types;
+    for (Symbol* a : args) types.push_back(a->type);
+    FunctionSymbol* fn = resolveOverload(opname, types, at, nullptr, false);
+    if (!fn) return nullptr;
+    std::vector<Symbol*> callArgs = args;
+    std::vector<LRef> refs(args.size());
+    if (fn->builtin) return builtinCall(fn, at, callArgs, refs, nullptr);
+    return inlineCall(fn, at, callArgs, refs);
 }
 
 Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
@@ -932,7 +984,7 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
     }
     if (m_checkOnly && m_currentFunction) {
         // While checking a function on its own, a call only needs its types.
-        Symbol* r = fn->ret.is_void() ? temp(TypeSpec(TypeDesc(TypeDesc::NONE))) : temp(fn->ret);
+        Symbol* r = fn->ret.is_void() ? voidValue() : temp(fn->ret);
         return r;
     }
     const Node* decl = fn->decl;
@@ -940,6 +992,8 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
     Symbol* result = fn->ret.is_void() ? nullptr : temp(fn->ret);
     std::vector<std::pair<size_t, Symbol*>> writeBacks;
     auto savedScopes = std::move(m_scopes);
+    int savedShaderDepth = m_shaderScopeDepth;
+    m_shaderScopeDepth = -1;
     m_scopes.clear();
     m_scopes.push_back(savedScopes.front()); // global scope only
     pushScope();
@@ -987,10 +1041,11 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
     }
     (*m_ops)[callop].jumps = {nextOp()};
     m_scopes = std::move(savedScopes);
+    m_shaderScopeDepth = savedShaderDepth;
     m_curLine = e->line;
     m_curFile = e->file;
     for (auto& wb : writeBacks) store(refs[wb.first], wb.second, e);
-    return result ? result : temp(TypeSpec(TypeDesc(TypeDesc::NONE)));
+    return result ? result : voidValue();
 }
 
 } // namespace OSL::pvt

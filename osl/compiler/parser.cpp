@@ -134,6 +134,7 @@ void Parser::metadataBlock(std::vector<NodePtr>& out) {
     while (accept("[[")) {
         if (accept("]]")) continue;
         do {
+            if (isPunct("]]")) break; // a trailing comma
             const Token& at = peek();
             auto m = make(NodeKind::Metadata, at);
             m->typeName = parseType();
@@ -339,12 +340,13 @@ NodePtr Parser::statement() {
             expect(";");
             return n;
         }
-        if ((isTypeStart() || at.text == "output") && !isPunct("(", 1) &&
-            !(isPunct("(", 2) && at.text == "closure")) {
-            TypeName tn = parseType();
-            if (!isPunct("(", 1)) return varDecl(tn, at);
-            // A function defined inside a block.
-            fail("function definitions are only allowed at global scope");
+        if (isTypeStart()) {
+            size_t k = at.text == "closure" ? 2 : 1; // the token after the type
+            if (peek(k).kind == Tok::Ident && isPunct("(", k + 1)) return functionOrShader(false);
+            if (peek(k).kind == Tok::Ident) {
+                TypeName tn = parseType();
+                return varDecl(tn, at);
+            }
         }
         if (at.text == "struct") return structDecl();
     }
