@@ -287,8 +287,6 @@ void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
     for (const auto& s : n->body->kids) statement(s.get());
     popScope();
     m_inline.pop_back();
-    if (!fn->ret.is_void() && !m_sawReturn)
-        error(n->body.get(), "non-void function \"" + fn->name + "\" had no 'return' statement.");
     m_currentFunction = savedFn;
     m_sawReturn = savedReturn;
     popScope();
@@ -499,6 +497,22 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
         if (!t.is_unsized_array()) fillZero(s);
         return;
     }
+    if (t.is_structure() && init->kind == NodeKind::InitList &&
+        init->kids.size() <= s->fields.size()) {
+        // A struct default made of constants gives each field its own default.
+        bool allConst = true;
+        for (size_t i = 0; i < s->fields.size() && allConst; ++i) {
+            Symbol* f = s->fields[i];
+            if (i >= init->kids.size()) {
+                fillZero(f);
+                continue;
+            }
+            allConst = !f->type.is_structure_based() && !f->type.is_closure_based() &&
+                       constValue(init->kid(i), f->type, f->ivals, f->fvals, f->svals);
+        }
+        if (allConst) return;
+        for (Symbol* f : s->fields) f->ivals.clear(), f->fvals.clear(), f->svals.clear();
+    }
     if (!t.is_structure_based() && !t.is_closure_based()) {
         std::vector<int> iv;
         std::vector<float> fv;
@@ -609,7 +623,19 @@ void CodeGen::statement(const Node* s) {
         returnStatement(s);
         break;
     case NodeKind::StructDecl:
-        declareStruct(s);
+        if (!m_declaredFunctions.count(s)) {
+            m_declaredFunctions.insert(s);
+            declareStruct(s);
+        }
+        break;
+    case NodeKind::FunctionDecl:
+        // A function defined inside another body: declared (and checked) on first sight.
+        if (!m_declaredFunctions.count(s)) {
+            m_declaredFunctions.insert(s);
+            declareFunction(s);
+            FunctionSymbol* fn = m_functions[s->name].back().get();
+            if (!fn->builtin) checkFunctionBody(fn);
+        }
         break;
     default:
         break;

@@ -864,7 +864,19 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected) {
             args.push_back(load(r, a));
             const_cast<Node*>(a)->type = args.back()->type;
         } else {
-            args.push_back(expr(a));
+            const TypeSpec* hint = nullptr;
+            if (a->kind == NodeKind::InitList) {
+                // `{...}` takes its type from the parameter it is passed to.
+                size_t idx = refs.size();
+                auto fit = m_functions.find(e->name);
+                if (fit != m_functions.end())
+                    for (auto& cand : fit->second)
+                        if (cand->params.size() == e->kids.size() && idx < cand->params.size()) {
+                            hint = &cand->params[idx].type;
+                            break;
+                        }
+            }
+            args.push_back(expr(a, hint));
         }
         refs.push_back(r);
         types.push_back(args.back()->type);
@@ -1023,9 +1035,13 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
     m_currentFunction = nullptr;
     auto savedLoops = std::move(m_loops);
     m_loops.clear();
+    bool savedSawReturn = m_sawReturn;
+    m_sawReturn = false;
     pushScope();
     for (const auto& s : decl->body->kids) statement(s.get());
     popScope();
+    bool returned = m_sawReturn;
+    m_sawReturn = savedSawReturn;
     m_loops = std::move(savedLoops);
     m_currentFunction = savedFn;
     --m_silent;
@@ -1040,6 +1056,9 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
                 if (j > last) j = last;
     }
     (*m_ops)[callop].jumps = {nextOp()};
+    // Reported where the function is used, as the reference compiler does.
+    if (result && !returned)
+        error(e, "non-void function \"" + fn->name + "\" had no 'return' statement.");
     m_scopes = std::move(savedScopes);
     m_shaderScopeDepth = savedShaderDepth;
     m_curLine = e->line;

@@ -729,7 +729,7 @@ std::vector<PPToken> Preprocessor::substitute(const Macro& m,
 std::vector<PPToken> Preprocessor::expand(std::vector<PPToken> input, const std::string& file) {
     std::vector<PPToken> out;
     std::vector<PPToken> stack(input.rbegin(), input.rend());
-    size_t budget = 2000000; // hard bound on work, so no input can make expansion run forever
+    size_t budget = 200000; // hard bound on work, so no input can make expansion run forever
     while (!stack.empty()) {
         if (--budget == 0) {
             m_diag.error(file, stack.back().line, "macro expansion too large");

@@ -30,8 +30,12 @@ std::string run(const std::string& src, bool* ok = nullptr, Capture* cap = nullp
 // The text after the leading line marker, with runs of spaces collapsed.
 std::string body(const std::string& out) {
     std::string s = out.substr(out.find('\n') + 1), r;
-    for (char c : s)
-        if (!(c == ' ' && !r.empty() && r.back() == ' ')) r += c;
+    for (char c : s) {
+        if (c == ' ' && !r.empty() && r.back() == ' ') continue;
+        if (c == '\n' && !r.empty() && r.back() == ' ' && r.size() > 1 && r[r.size() - 2] != '\n')
+            r.pop_back();
+        r += c;
+    }
     return r;
 }
 
