@@ -414,7 +414,7 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
                 Parameter(*g, pname, t, v.data(), lockgeom);
             }
         } else {
-            m_impl->error("Unknown statement in shader group specification: \"" + stmt + "\"");
+            m_impl->error("Unknown statement in serialized shader group: \"" + stmt + "\"");
             ok = false;
         }
     }

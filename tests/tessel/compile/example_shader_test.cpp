@@ -8,7 +8,7 @@ namespace {
 
 const char* kExampleShader =
     "// A simple example shader with three inputs and two outputs, showing the syntax.\n"
-    "// The OSL language specification describes everything a shader may do.\n"
+    "// The OSL language reference describes everything a shader may do.\n"
     "// The editor's \"More...\" button leads to more shaders.\n"
     "//\n"
     "\n"
