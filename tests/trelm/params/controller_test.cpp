@@ -12,28 +12,12 @@
 using namespace trelm_test;
 
 namespace {
-class ControllerTest : public ::testing::Test {
+class ControllerTest : public EveryTypeBlockTest {
 protected:
     void SetUp() override {
-        theHold.ClearStacks();
         SetFrameRate(30);
-        desc.reset(MakeEveryTypeDesc(&cd, &accessor));
-        owner = new Owner(2);
-        cd.MakeAutoParamBlocks(owner);
-        pb = owner->Block(1);
+        EveryTypeBlockTest::SetUp();
     }
-    void TearDown() override {
-        owner->DeleteMe();
-        // Undo records may still hold blocks, which need their descriptor until they go.
-        theHold.ClearStacks();
-        desc.reset();
-    }
-
-    TestClassDesc cd;
-    LabelAccessor accessor;
-    std::unique_ptr<ParamBlockDesc2> desc;
-    Owner* owner = nullptr;
-    IParamBlock2* pb = nullptr;
 };
 
 // The expression controller as plug-in code makes one: through the class directory and its

@@ -9,28 +9,8 @@
 using namespace trelm_test;
 
 namespace {
-class ParamBlockTest : public ::testing::Test {
+class ParamBlockTest : public EveryTypeBlockTest {
 protected:
-    void SetUp() override {
-        theHold.ClearStacks();
-        desc.reset(MakeEveryTypeDesc(&cd, &accessor));
-        owner = new Owner(2);
-        cd.MakeAutoParamBlocks(owner);
-        pb = owner->Block(1);
-        ASSERT_NE(pb, nullptr);
-    }
-    void TearDown() override {
-        owner->DeleteMe();
-        // Undo records may still hold blocks, which need their descriptor until they go.
-        theHold.ClearStacks();
-        desc.reset();
-    }
-
-    TestClassDesc cd;
-    LabelAccessor accessor;
-    std::unique_ptr<ParamBlockDesc2> desc;
-    Owner* owner = nullptr;
-    IParamBlock2* pb = nullptr;
     const TimeValue times[3] = {0, 800, -4800};
 };
 } // namespace

@@ -10,28 +10,12 @@
 using namespace trelm_test;
 
 namespace {
-class ParamUndoTest : public ::testing::Test {
+class ParamUndoTest : public EveryTypeBlockTest {
 protected:
-    void SetUp() override {
-        theHold.ClearStacks();
-        desc.reset(MakeEveryTypeDesc(&cd, &accessor));
-        owner = new Owner(2);
-        cd.MakeAutoParamBlocks(owner);
-        pb = owner->Block(1);
-    }
     void TearDown() override {
         EXPECT_EQ(theHold.Level(), 0);
-        owner->DeleteMe();
-        // Undo records may still hold blocks, which need their descriptor until they go.
-        theHold.ClearStacks();
-        desc.reset();
+        EveryTypeBlockTest::TearDown();
     }
-
-    TestClassDesc cd;
-    LabelAccessor accessor;
-    std::unique_ptr<ParamBlockDesc2> desc;
-    Owner* owner = nullptr;
-    IParamBlock2* pb = nullptr;
 };
 } // namespace
 

@@ -8,6 +8,9 @@
 #include <trelm/params/class_desc2.h>
 #include <trelm/params/iparam_block2.h>
 
+#include <gtest/gtest.h>
+
+#include <memory>
 #include <vector>
 
 namespace trelm_test {
@@ -178,5 +181,30 @@ inline ParamBlockDesc2* MakeEveryTypeDesc(ClassDesc2* cd, PBAccessor* accessor) 
         AColor(1, 0, 0, 1), p_end, kPoint2Tab, L"UVs", TYPE_POINT2_TAB, 1, P_ANIMATABLE, 0, p_end,
         p_end);
 }
+
+// A fresh owner with one block of every parameter type, and empty undo stacks, per test.
+class EveryTypeBlockTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        theHold.ClearStacks();
+        desc.reset(MakeEveryTypeDesc(&cd, &accessor));
+        owner = new Owner(2);
+        cd.MakeAutoParamBlocks(owner);
+        pb = owner->Block(1);
+        ASSERT_NE(pb, nullptr);
+    }
+    void TearDown() override {
+        owner->DeleteMe();
+        // Undo records may still hold blocks, which need their descriptor until they go.
+        theHold.ClearStacks();
+        desc.reset();
+    }
+
+    TestClassDesc cd;
+    LabelAccessor accessor;
+    std::unique_ptr<ParamBlockDesc2> desc;
+    Owner* owner = nullptr;
+    IParamBlock2* pb = nullptr;
+};
 
 } // namespace trelm_test
