@@ -449,6 +449,9 @@ int runShade(const std::vector<std::string>& args) {
                 else
                     ss.attribute(k, string_view(v));
             }
+        } else if (base == "-colorspace") {
+            if (!need(1)) break;
+            ss.attribute("colorspace", string_view(args[++i]));
         } else if (base == "-texoptions") {
             if (!need(1)) break;
             ss.texturesys()->attribute("options", args[++i]);

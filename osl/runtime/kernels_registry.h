@@ -27,5 +27,11 @@ int selectMathKernel(KernelChoice& k);
 int selectDataKernel(KernelChoice& k);
 int selectStringKernel(KernelChoice& k);
 int selectShadingKernel(KernelChoice& k);
+int selectNoiseKernel(KernelChoice& k);
+int selectGaborKernel(KernelChoice& k);
+int selectSplineKernel(KernelChoice& k);
+int selectColorKernel(KernelChoice& k);
+int selectTextureKernel(KernelChoice& k);
+int selectLibraryKernel(KernelChoice& k);
 
 } // namespace OSL

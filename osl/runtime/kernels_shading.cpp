@@ -366,8 +366,9 @@ bool selectKernel(ShadingSystemImpl& sys, Program& prog, Instr& in, ustring opna
         return true;
     }
     KernelChoice k{sys, prog, in, opname, error};
-    for (auto family :
-         {selectShadingKernel, selectMathKernel, selectDataKernel, selectStringKernel}) {
+    for (auto family : {selectShadingKernel, selectMathKernel, selectDataKernel, selectStringKernel,
+                        selectNoiseKernel, selectGaborKernel, selectSplineKernel, selectColorKernel,
+                        selectTextureKernel, selectLibraryKernel}) {
         const int r = family(k);
         if (r > 0) return true;
         if (r < 0) return false;
