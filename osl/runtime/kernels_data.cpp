@@ -377,6 +377,10 @@ bool opTakesDerivs(ustring opname, int arg) {
     if (arg == 1 && (op == "Dx" || op == "Dy" || op == "Dz" || op == "filterwidth" ||
                      op == "area" || op == "calculatenormal"))
         return true;
+    // Texture filtering reads the footprint of its coordinates.
+    if ((op == "texture" && (arg == 2 || arg == 3)) || (op == "texture3d" && arg == 2) ||
+        (op == "environment" && arg == 2))
+        return true;
     return false;
 }
 
