@@ -8,7 +8,7 @@ PACKAGES=(
     build-essential cmake ninja-build pkg-config python3 git
     libopenimageio-dev openimageio-tools libimath-dev
     qt6-base-dev qt6-tools-dev qt6-tools-dev-tools libqt6opengl6-dev libxkbcommon-dev libgl-dev
-    libgtest-dev libgmock-dev libbenchmark-dev nlohmann-json3-dev libcli11-dev
+    libgtest-dev libgmock-dev libbenchmark-dev nlohmann-json3-dev libcli11-dev libpugixml-dev
     glslang-tools xvfb xauth fonts-dejavu-core
 )
 
