@@ -161,8 +161,8 @@ void kTriple1(ExecState& st, const Instr& in) {
     const Operand& R = in.args[0];
     for (int c = 0; c < 3; ++c) st.store(R, c, st.dual(in.args[1], c));
 }
-// A triple given in a named space: points, vectors and normals go from that space to common;
-// colours from the named colour space to RGB.
+// A point, vector or normal given in a named space goes from that space to common (colours in a
+// named space are the colour family's).
 template <int Kind>
 void kTripleSpace(ExecState& st, const Instr& in) {
     const Operand& R = in.args[0];
@@ -171,15 +171,6 @@ void kTripleSpace(ExecState& st, const Instr& in) {
         v.elem(d) =
             Vec3(st.comp(in.args[2], 0, d), st.comp(in.args[3], 0, d), st.comp(in.args[4], 0, d));
     const ustring space = *st.s(in.args[1]);
-    if (Kind == 3) {
-        Vec3 rgb;
-        if (!colorFromSpace(space, v.val(), rgb)) {
-            shaderError(st, in, "Unknown color space \"" + space.string() + "\"");
-            rgb = v.val();
-        }
-        st.storeVec(R, rgb);
-        return;
-    }
     Matrix44 m;
     if (!getSpaceMatrix(st, space, m, true)) {
         shaderError(st, in, "Unknown transformation \"" + space.string() + "\"");
@@ -250,21 +241,6 @@ void kTransform(ExecState& st, const Instr& in) {
         m = ok ? mf * mt : Matrix44();
     }
     st.storeVec(R, transformDual(m, st.dvec(P), Kind));
-}
-
-void kTransformc(ExecState& st, const Instr& in) {
-    const Operand& R = in.args[0];
-    const ustring from = in.nargs == 4 ? *st.s(in.args[1]) : ustring("rgb");
-    const ustring to = *st.s(in.args[in.nargs - 2]);
-    const Vec3 c = st.vec(in.args[in.nargs - 1]);
-    Vec3 rgb, out;
-    bool ok = colorFromSpace(from, c, rgb);
-    if (!ok) shaderError(st, in, "Unknown color space \"" + from.string() + "\"");
-    if (ok && !colorToSpace(to, rgb, out)) {
-        shaderError(st, in, "Unknown color space \"" + to.string() + "\"");
-        ok = false;
-    }
-    st.storeVec(R, ok ? out : c);
 }
 
 void kDeterminant(ExecState& st, const Instr& in) {
@@ -346,11 +322,10 @@ int selectDataKernel(KernelChoice& k) {
     if (op == "color" || op == "point" || op == "vector" || op == "normal") {
         if (n == 4) return k.in.fn = kTriple3, 1;
         if (n == 2) return k.in.fn = kTriple1, 1;
-        if (n == 5) {
+        if (n == 5 && op != "color") {
             k.in.fn = op == "point"    ? kTripleSpace<0>
                       : op == "vector" ? kTripleSpace<1>
-                      : op == "normal" ? kTripleSpace<2>
-                                       : kTripleSpace<3>;
+                                       : kTripleSpace<2>;
             return 1;
         }
         return 0;
@@ -359,7 +334,6 @@ int selectDataKernel(KernelChoice& k) {
     if (op == "transform" && (n == 3 || n == 4)) return k.in.fn = kTransform<0>, 1;
     if (op == "transformv" && (n == 3 || n == 4)) return k.in.fn = kTransform<1>, 1;
     if (op == "transformn" && (n == 3 || n == 4)) return k.in.fn = kTransform<2>, 1;
-    if (op == "transformc" && (n == 3 || n == 4)) return k.in.fn = kTransformc, 1;
     if (op == "determinant" && n == 2) return k.in.fn = kDeterminant, 1;
     if (op == "transpose" && n == 2) return k.in.fn = kTranspose, 1;
     if (op == "getmatrix" && n == 4) return k.in.fn = kGetmatrix, 1;

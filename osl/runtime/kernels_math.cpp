@@ -429,13 +429,6 @@ void kNormalize(ExecState& st, const Instr& in) {
     const D2 len = lengthOf(v);
     for (int c = 0; c < 3; ++c) st.store(in.args[0], c, len.val() == 0.0f ? D2(0.0f) : v[c] / len);
 }
-void kLuminance(ExecState& st, const Instr& in) {
-    const Operand& C = in.args[1];
-    const D2 r =
-        st.dual(C, 0) * D2(0.2126f) + st.dual(C, 1) * D2(0.7152f) + st.dual(C, 2) * D2(0.0722f);
-    st.store(in.args[0], 0, r);
-}
-
 // ---- selection ------------------------------------------------------------------------------
 
 template <class F>
@@ -590,7 +583,6 @@ int selectMathKernel(KernelChoice& k) {
     if (op == "length" && n == 2) return k.in.fn = kLength, 1;
     if (op == "distance" && (n == 3 || n == 4)) return k.in.fn = kDistance, 1;
     if (op == "normalize" && n == 2) return k.in.fn = kNormalize, 1;
-    if (op == "luminance" && n == 2) return k.in.fn = kLuminance, 1;
     return 0;
 }
 

@@ -99,16 +99,6 @@ void kGetchar(ExecState& st, const Instr& in) {
 void kHash(ExecState& st, const Instr& in) {
     *st.i(in.args[0]) = int(st.s(in.args[1])->hash());
 }
-void kSplit(ExecState& st, const Instr& in) {
-    const std::string s = st.s(in.args[1])->string();
-    const Operand& results = in.args[2];
-    const std::string sep = in.nargs > 3 ? st.s(in.args[3])->string() : std::string();
-    const int maxsplit = in.nargs > 4 ? st.integer(in.args[4]) : std::max<int>(1, results.arraylen);
-    std::vector<std::string> parts = OIIO::Strutil::splits(s, sep, maxsplit);
-    const int n = std::min<int>(int(parts.size()), std::max<int>(1, results.arraylen));
-    for (int k = 0; k < n; ++k) st.s(results)[k] = ustring(parts[size_t(k)]);
-    *st.i(in.args[0]) = n;
-}
 
 } // namespace
 
@@ -129,7 +119,6 @@ int selectStringKernel(KernelChoice& k) {
     if (op == "stof" && n == 2) return k.in.fn = kStof, 1;
     if (op == "getchar" && n == 3) return k.in.fn = kGetchar, 1;
     if (op == "hash" && n == 2 && k.arg(1).isString) return k.in.fn = kHash, 1;
-    if (op == "split" && n >= 3) return k.in.fn = kSplit, 1;
     return 0;
 }
 

@@ -1,4 +1,4 @@
-// Named coordinate systems (through the renderer services) and colour spaces.
+// Named coordinate systems (through the renderer services).
 #pragma once
 
 #include "shading_context.h"
@@ -13,9 +13,5 @@ bool getSpaceMatrix(ExecState& st, ustring space, Matrix44& m, bool toCommon);
 
 // Transforms a value with derivatives as a point (0), vector (1) or normal (2).
 Dual2<Vec3> transformDual(const Matrix44& m, const Dual2<Vec3>& v, int kind);
-
-// Conversions between linear RGB and the named colour spaces (rgb, hsv, hsl, YIQ, XYZ, xyY).
-bool colorFromSpace(ustring space, const Vec3& c, Vec3& rgb);
-bool colorToSpace(ustring space, const Vec3& rgb, Vec3& c);
 
 } // namespace OSL
