@@ -1,0 +1,25 @@
+// The example shader of a new map.
+#include "map/example_shader.h"
+
+const char* const kExampleShader =
+    "// A simple example shader with three inputs and two outputs, to demonstrate the syntax.\n"
+    "// The OSL language specification describes everything a shader can do.\n"
+    "// The editor's \"More...\" button leads to further shaders and help.\n"
+    "//\n"
+    "\n"
+    "shader Example\n"
+    "[[ string help=\"Example shader with three inputs and two outputs,<br>one summing (Out), "
+    "one mixing (Mix).  \", string URL =\"https://tessel.dev/docs/example\" ]]\n"
+    "(\n"
+    "\t// Inputs\n"
+    "\tcolor Input_A = 0.5 [[ string label = \"A\"]],\n"
+    "\tcolor Input_B = 0.5 [[ string label = \"B\"]],\n"
+    "\tfloat Mixer   = 0.5 [[ float min = 0.0, float max = 1.0 ]],\n"
+    "\t// Outputs\n"
+    "\toutput color Out = 0.0,\n"
+    "\toutput color Mix = 0.0\n"
+    ")\n"
+    "{\n"
+    "\tOut = Input_A + Input_B; // Sum\n"
+    "\tMix = mix(Input_A, Input_B, Mixer); // Mix\n"
+    "}\n";
