@@ -157,14 +157,15 @@ TEST(ColorSystem, BlackbodyIsContinuousAndDimBelowDraper) {
 }
 
 TEST(ColorSystem, WavelengthColorMatchesReferenceImage) {
-    // The wavelength_color case shades a 1000x64 grid with lambda = 1000 u.
+    // The wavelength_color case shades a 1000x64 grid (u = x / 999, no pixel centring) with
+    // lambda = 1000 u.
     OIIO::ImageBuf ref(std::string(TESSEL_SHARED_DIR) +
                        "/osl-conformance/testsuite/wavelength_color/ref/out.exr");
     ASSERT_TRUE(ref.read(0, 0, true, OIIO::TypeFloat)) << ref.geterror();
     ASSERT_EQ(ref.spec().width, 1000);
     const ColorSystem& cs = rec709();
     for (int x = 0; x < 1000; x += 7) {
-        const float u = (float(x) + 0.5f) / 1000.0f;
+        const float u = float(x) / 999.0f;
         const Vec3 got = cs.wavelengthColor(1000.0f * u);
         float px[3];
         ref.getpixel(x, 10, px, 3);
