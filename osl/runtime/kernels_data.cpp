@@ -355,6 +355,11 @@ bool opTakesDerivs(ustring opname, int arg) {
     if ((op == "texture" && (arg == 2 || arg == 3)) || (op == "texture3d" && arg == 2) ||
         (op == "environment" && arg == 2))
         return true;
+    // noise("gabor", ...) filters with the footprint of its position (arguments 2 and 3 when
+    // the op has a name); the name is not visible here, so every noise form marks them.
+    if ((arg == 2 || arg == 3) &&
+        (op == "noise" || op == "pnoise" || op == "snoise" || op == "psnoise"))
+        return true;
     return false;
 }
 
