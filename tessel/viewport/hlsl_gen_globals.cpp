@@ -1,6 +1,8 @@
 // The converter table and the OSL globals the viewport knows, built once per translation.
 #include "hlsl_gen_globals.h"
 
+#include "precompute_function.h"
+
 namespace oslo {
 
 HLSLGenGlobals::HLSLGenGlobals(_hlsl_info& info_) : info(info_) {
@@ -12,6 +14,7 @@ HLSLGenGlobals::HLSLGenGlobals(_hlsl_info& info_) : info(info_) {
     AddAttributeConverters(converters);
     AddTextureConverters(converters, info);
     AddUnsupportedConverters(converters);
+    precomputeBuilders = PrecomputeBuilders();
 
     globalVars = {
         {"P", "state.position"},         {"N", "state.normal"},

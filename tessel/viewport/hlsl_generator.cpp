@@ -3,6 +3,7 @@
 #include "hlsl_generator.h"
 
 #include "hlsl_names.h"
+#include "precompute_function.h"
 
 #include <sstream>
 
@@ -45,6 +46,16 @@ void DeclareArrayConstant(const OSOSymbol& symbol, HLSLGenGlobals& globals, int 
         for (size_t i = 0; i + 2 < values.size(); i += 3)
             out << (i ? "," : "") << "float3(" << values[i] << "," << values[i + 1] << ","
                 << values[i + 2] << ") ";
+    } else if (element.is_string()) {
+        // Strings are their hashes in the viewport, element by element.
+        const std::vector<std::string>& texts = symbol.stringDefaults;
+        for (size_t i = 0; i < texts.size(); ++i) out << (i ? "," : "") << StringHash(texts[i]);
+    } else if (element.is_matrix()) {
+        for (size_t i = 0; i + 15 < values.size(); i += 16) {
+            out << (i ? "," : "") << "float4x4(";
+            for (size_t k = 0; k < 16; ++k) out << (k ? "," : "") << values[i + k];
+            out << ") ";
+        }
     } else {
         RecordMessage(globals.info, "Unsupported array constant");
         globals.failed = true;
@@ -188,7 +199,6 @@ void DeclareSymbols(const std::map<std::string, OSOSymbol>& symbols, HLSLGenGlob
 
 bool GenerateBody(const OSOData& oso, std::string& body, HLSLGenGlobals& globals,
                   const std::string& name, _hlsl_info& info) {
-    (void)name;
     std::ostringstream out;
     const int depth = 1;
     info.opCount = 0;
@@ -214,6 +224,7 @@ bool GenerateBody(const OSOData& oso, std::string& body, HLSLGenGlobals& globals
     }
     const auto main = oso.sections.find("___main___");
     if (main == oso.sections.end()) return false;
+    if (!BuildPrecomputeFunction(main->second, oso, globals, name)) return false;
     if (!GenerateSection(main->second, oso, depth, globals, out, info)) return false;
 
     if (info.opCount == 0) {

@@ -246,6 +246,11 @@ void AddArithmeticConverters(std::map<std::string, OpConverter>& c) {
         p.out << Arg(p, 0) << " = float3(" << Arg(p, 1) << ", " << Arg(p, 2) << ", " << Arg(p, 3)
               << ");";
     });
+    // select(a, b, cond) takes b where cond is non-zero; a vector condition selects per component.
+    c["select"] = Fixed(4, [](OpConverterParams& p) {
+        p.out << Arg(p, 0) << " = (" << Arg(p, 3) << " != 0) ? " << Arg(p, 2) << " : " << Arg(p, 1)
+              << ";";
+    });
     c["point"] = triple;
     c["vector"] = triple;
     c["assign"] = ConvertAssign;

@@ -27,6 +27,7 @@ void OSOData::symbol(OSL::SymType symtype, OSL::TypeSpec typespec, const char* n
 
 void OSOData::symdefault(const char* def) {
     m_pendingSymbol.stringDefault = def;
+    m_pendingSymbol.stringDefaults.push_back(def);
 }
 
 void OSOData::symdefault(float def) {

@@ -28,8 +28,10 @@ struct OSOSymbol {
     std::string name;
     // Integer defaults are stored as floats, so values above 2^24 lose precision.
     std::vector<float> floatDefaults;
-    // Only the last string default of a symbol is kept.
+    // The last string default of a symbol.
     std::string stringDefault;
+    // Every string default in order: the elements of a string array constant.
+    std::vector<std::string> stringDefaults;
 };
 
 struct Instruction {

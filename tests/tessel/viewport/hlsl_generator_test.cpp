@@ -199,11 +199,32 @@ TEST(GenerateHLSL, ArrayConstantsAreInitialisedArrays) {
     ExpectCompiles(t.text);
 }
 
-TEST(GenerateHLSL, StringArrayConstantsFail) {
-    const auto t = Translate(OSO("oparam\tfloat\tr\t0\nconst\tstring[2]\t$const1\t\"a\" \"b\"\n",
-                                 "code ___main___\n\tend\n"));
-    EXPECT_FALSE(t.ok);
-    EXPECT_EQ(t.info.messages.count("Unsupported array constant"), 1u);
+TEST(GenerateHLSL, StringArrayConstantsHoldTheHashOfEachElement) {
+    const auto t = Translate(OSO("oparam\tint\tr\t0\nconst\tstring[2]\t$const1\t\"a\" \"b\"\n"
+                                 "const\tint\t$const2\t1\n",
+                                 "code ___main___\n\taref\tr $const1 $const2\n\tend\n"));
+    ASSERT_TRUE(t.ok) << t.text;
+    EXPECT_TRUE(Contains(t.text, "\tint _const1_[2] = {" + oslo::HashText("a") + "," +
+                                     oslo::HashText("b") + "};\n"));
+    EXPECT_TRUE(Contains(t.text, "\tr_ = _const1_[1];\n"));
+    EXPECT_EQ(t.info.messages.count("Unsupported array constant"), 0u);
+    ExpectCompiles(t.text);
+}
+
+TEST(GenerateHLSL, MatrixArrayConstantsListEachMatrix) {
+    std::string values;
+    for (int m = 0; m < 2; ++m)
+        for (int i = 0; i < 16; ++i) values += std::to_string(i % 5 == 0 ? m + 1 : 0) + " ";
+    const auto t = Translate(OSO("oparam\tmatrix\tr\t1 0 0 0 0 1 0 0 0 0 1 0 0 0 0 1\n"
+                                 "const\tmatrix[2]\t$const1\t" +
+                                     values + "\nconst\tint\t$const2\t1\n",
+                                 "code ___main___\n\taref\tr $const1 $const2\n\tend\n"));
+    ASSERT_TRUE(t.ok) << t.text;
+    EXPECT_TRUE(Contains(t.text,
+                         "\tfloat4x4 _const1_[2] = {float4x4(1,0,0,0,0,1,0,0,0,0,1,0,0,0,0,1) "
+                         ",float4x4(2,0,0,0,0,2,0,0,0,0,2,0,0,0,0,2) };\n"))
+        << t.text;
+    ExpectCompiles(t.text);
 }
 
 TEST(GenerateHLSL, AccuracyCountsUnsupportedInstructions) {
@@ -233,11 +254,11 @@ TEST(GenerateHLSL, UnknownOpFailsTheTranslation) {
     oslo::_hlsl_info earlier;
     earlier.messages["kept from before"] = 2;
     const auto t = Translate(
-        OSO("oparam\tfloat\tr\t0\nglobal\tpoint\tP\n", "code ___main___\n\tpnoise\tr P P\n\tend\n"),
+        OSO("oparam\tfloat\tr\t0\nglobal\tpoint\tP\n", "code ___main___\n\twobble\tr P P\n\tend\n"),
         earlier);
     EXPECT_FALSE(t.ok);
     EXPECT_EQ(t.text, "untouched");
-    EXPECT_EQ(t.info.messages.at("Unknown OPcode 'pnoise' - conversion failed."), 1);
+    EXPECT_EQ(t.info.messages.at("Unknown OPcode 'wobble' - conversion failed."), 1);
     EXPECT_EQ(t.info.messages.at("kept from before"), 2);
     EXPECT_EQ(t.info.unsupportedCount, 1);
     EXPECT_EQ(t.info.accuracy, 0);

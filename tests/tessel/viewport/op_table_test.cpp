@@ -404,8 +404,13 @@ TEST(OpTable, TextureColorSpaceOnlyWithColorManagement) {
 }
 
 TEST(OpTable, TextureNeedsItsSamplerAndConstantOptionNames) {
-    const std::string oso = OSO(kTexture, "code ___main___\n\ttexture\tCout Tex u v\n\tend\n");
-    EXPECT_FALSE(TranslateWithPrecomputed(oso, {}, {}).ok);
+    // The precompute pass only looks at the main code, so a lookup in a parameter's default code
+    // has no sampler.
+    const std::string inDefault = OSO(kTexture + "param\tcolor\tDef\t0 0 0\n",
+                                      "code Def\n\ttexture\tDef Tex u v\ncode ___main___\n\tend\n");
+    const auto noSampler = Translate(inDefault);
+    EXPECT_FALSE(noSampler.ok);
+    EXPECT_EQ(noSampler.info.messages.count("Unknown OPcode 'texture' - conversion failed."), 1u);
     const std::string variableOption =
         OSO(kTexture, "code ___main___\n\ttexture\tCout Tex u v Tex A\n\tend\n");
     EXPECT_FALSE(TranslateWithPrecomputed(variableOption, {{0, "texture_Tex"}}, {}).ok);
@@ -435,7 +440,11 @@ TEST(OpTable, StringOpsReadTheirPrecomputedInput) {
     ASSERT_TRUE(t.ok) << t.text;
     EXPECT_TRUE(Contains(t.text, "\tn_ = strlen_0;\n"));
     ExpectCompiles(t.text);
-    EXPECT_FALSE(TranslateWithPrecomputed(oso, {}, {}).ok);
+    const auto inDefault = Translate(OSO("oparam\tint\tn\t0\nparam\tstring\ts\t\"abc\"\n"
+                                         "param\tint\tm\t0\n",
+                                         "code m\n\tstrlen\tm s\ncode ___main___\n\tend\n"));
+    EXPECT_FALSE(inDefault.ok);
+    EXPECT_EQ(inDefault.info.messages.count("Unknown OPcode 'strlen' - conversion failed."), 1u);
 }
 
 } // namespace

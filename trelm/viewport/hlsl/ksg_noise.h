@@ -114,8 +114,17 @@ float3 hashnoise_3_4(float4 p) { return ksg_hash_vector(ksg_hash_keys_of(p), 4);
 
 // The gradient selector of a lattice point. A float result uses the whole hash; channel c of a
 // vector result uses byte c of it.
-int ksg_lattice_hash(int4 cell, int n, int channel) {
-    uint h = ksg_hash_keys(asuint(cell), n);
+// A periodic noise wraps each lattice coordinate into [0, period); a period of 0 leaves the
+// coordinate as it is.
+int4 ksg_wrap_cell(int4 cell, int4 period) {
+    int4 safe = max(period, 1);
+    int4 r = cell % safe;
+    r += (r < 0) ? safe : 0;
+    return (period > 0) ? r : cell;
+}
+
+int ksg_lattice_hash(int4 cell, int n, int channel, int4 period) {
+    uint h = ksg_hash_keys(asuint(ksg_wrap_cell(cell, period)), n);
     if (channel < 0)
         return (int)h;
     return (int)((h >> (8u * (uint)channel)) & 0xFFu);
@@ -161,33 +170,33 @@ float ksg_bilerp(float v0, float v1, float v2, float v3, float s, float t) {
     return ksg_lerp(ksg_lerp(v0, v1, s), ksg_lerp(v2, v3, s), t);
 }
 
-float ksg_perlin1(float x, int channel) {
+float ksg_perlin1(float x, int channel, int4 period) {
     int X = (int)floor(x);
     float fx = x - (float)X;
-    float g0 = ksg_grad(ksg_lattice_hash(int4(X, 0, 0, 0), 1, channel), fx);
-    float g1 = ksg_grad(ksg_lattice_hash(int4(X + 1, 0, 0, 0), 1, channel), fx - 1.0);
+    float g0 = ksg_grad(ksg_lattice_hash(int4(X, 0, 0, 0), 1, channel, period), fx);
+    float g1 = ksg_grad(ksg_lattice_hash(int4(X + 1, 0, 0, 0), 1, channel, period), fx - 1.0);
     return 0.25 * ksg_lerp(g0, g1, ksg_fade(fx));
 }
 
-float ksg_perlin2(float2 p, int channel) {
+float ksg_perlin2(float2 p, int channel, int4 period) {
     int2 c = (int2)floor(p);
     float2 f = p - (float2)c;
     float v[4];
     [unroll] for (int i = 0; i < 4; ++i) {
         int2 o = int2(i & 1, i >> 1);
-        v[i] = ksg_grad(ksg_lattice_hash(int4(c + o, 0, 0), 2, channel), f.x - o.x, f.y - o.y);
+        v[i] = ksg_grad(ksg_lattice_hash(int4(c + o, 0, 0), 2, channel, period), f.x - o.x, f.y - o.y);
     }
     return 0.6616 * ksg_bilerp(v[0], v[1], v[2], v[3], ksg_fade(f.x), ksg_fade(f.y));
 }
 
 // Trilinear blend of the gradients at the 8 corners of the cell of p (in the cube slice w).
-float ksg_perlin_cube(int4 c, float4 f, int n, int channel) {
+float ksg_perlin_cube(int4 c, float4 f, int n, int channel, int4 period) {
     float v[8];
     [unroll] for (int i = 0; i < 8; ++i) {
         int3 o = int3(i & 1, (i >> 1) & 1, i >> 2);
         int4 corner = int4(c.xyz + o, c.w);
         float3 d = f.xyz - (float3)o;
-        int h = ksg_lattice_hash(corner, n, channel);
+        int h = ksg_lattice_hash(corner, n, channel, period);
         v[i] = n == 3 ? ksg_grad(h, d.x, d.y, d.z) : ksg_grad(h, d.x, d.y, d.z, f.w);
     }
     float s = ksg_fade(f.x), t = ksg_fade(f.y), r = ksg_fade(f.z);
@@ -195,30 +204,93 @@ float ksg_perlin_cube(int4 c, float4 f, int n, int channel) {
                     ksg_bilerp(v[4], v[5], v[6], v[7], s, t), r);
 }
 
-float ksg_perlin3(float3 p, int channel) {
+float ksg_perlin3(float3 p, int channel, int4 period) {
     int4 c = int4((int3)floor(p), 0);
     float4 f = float4(p - (float3)c.xyz, 0.0);
-    return 0.9820 * ksg_perlin_cube(c, f, 3, channel);
+    return 0.9820 * ksg_perlin_cube(c, f, 3, channel, period);
 }
 
-float ksg_perlin4(float4 p, int channel) {
+float ksg_perlin4(float4 p, int channel, int4 period) {
     int4 c = (int4)floor(p);
     float4 f = p - (float4)c;
-    float near = ksg_perlin_cube(c, f, 4, channel);
-    float far = ksg_perlin_cube(c + int4(0, 0, 0, 1), f - float4(0, 0, 0, 1), 4, channel);
+    float near = ksg_perlin_cube(c, f, 4, channel, period);
+    float far = ksg_perlin_cube(c + int4(0, 0, 0, 1), f - float4(0, 0, 0, 1), 4, channel, period);
     return 0.8344 * ksg_lerp(near, far, ksg_fade(f.w));
 }
 
-float perlin_1_1(float1 p) { return ksg_perlin1(p.x, -1); }
-float perlin_1_2(float2 p) { return ksg_perlin2(p, -1); }
-float perlin_1_3(float3 p) { return ksg_perlin3(p, -1); }
-float perlin_1_4(float4 p) { return ksg_perlin4(p, -1); }
+// Aperiodic noise wraps nothing.
+static const int4 ksg_no_period = int4(0, 0, 0, 0);
+
+float perlin_1_1(float1 p) { return ksg_perlin1(p.x, -1, ksg_no_period); }
+float perlin_1_2(float2 p) { return ksg_perlin2(p, -1, ksg_no_period); }
+float perlin_1_3(float3 p) { return ksg_perlin3(p, -1, ksg_no_period); }
+float perlin_1_4(float4 p) { return ksg_perlin4(p, -1, ksg_no_period); }
 float3 perlin_3_1(float1 p) {
-    return float3(ksg_perlin1(p.x, 0), ksg_perlin1(p.x, 1), ksg_perlin1(p.x, 2));
+    return float3(ksg_perlin1(p.x, 0, ksg_no_period), ksg_perlin1(p.x, 1, ksg_no_period),
+                  ksg_perlin1(p.x, 2, ksg_no_period));
 }
-float3 perlin_3_2(float2 p) { return float3(ksg_perlin2(p, 0), ksg_perlin2(p, 1), ksg_perlin2(p, 2)); }
-float3 perlin_3_3(float3 p) { return float3(ksg_perlin3(p, 0), ksg_perlin3(p, 1), ksg_perlin3(p, 2)); }
-float3 perlin_3_4(float4 p) { return float3(ksg_perlin4(p, 0), ksg_perlin4(p, 1), ksg_perlin4(p, 2)); }
+float3 perlin_3_2(float2 p) {
+    return float3(ksg_perlin2(p, 0, ksg_no_period), ksg_perlin2(p, 1, ksg_no_period),
+                  ksg_perlin2(p, 2, ksg_no_period));
+}
+float3 perlin_3_3(float3 p) {
+    return float3(ksg_perlin3(p, 0, ksg_no_period), ksg_perlin3(p, 1, ksg_no_period),
+                  ksg_perlin3(p, 2, ksg_no_period));
+}
+float3 perlin_3_4(float4 p) {
+    return float3(ksg_perlin4(p, 0, ksg_no_period), ksg_perlin4(p, 1, ksg_no_period),
+                  ksg_perlin4(p, 2, ksg_no_period));
+}
+
+// ---- Periodic noise (pnoise, psnoise): name_D_N(position, period) ----
+
+// Integer periods, as the CPU shading system takes them: floored, at least 1.
+int4 ksg_period(float4 period) { return max((int4)floor(period), 1); }
+
+float pperlin_1_1(float1 p, float1 t) { return ksg_perlin1(p.x, -1, ksg_period(float4(t.x, 0, 0, 0))); }
+float pperlin_1_2(float2 p, float2 t) { return ksg_perlin2(p, -1, ksg_period(float4(t, 0, 0))); }
+float pperlin_1_3(float3 p, float3 t) { return ksg_perlin3(p, -1, ksg_period(float4(t, 0))); }
+float pperlin_1_4(float4 p, float4 t) { return ksg_perlin4(p, -1, ksg_period(t)); }
+float3 pperlin_3_1(float1 p, float1 t) {
+    int4 w = ksg_period(float4(t.x, 0, 0, 0));
+    return float3(ksg_perlin1(p.x, 0, w), ksg_perlin1(p.x, 1, w), ksg_perlin1(p.x, 2, w));
+}
+float3 pperlin_3_2(float2 p, float2 t) {
+    int4 w = ksg_period(float4(t, 0, 0));
+    return float3(ksg_perlin2(p, 0, w), ksg_perlin2(p, 1, w), ksg_perlin2(p, 2, w));
+}
+float3 pperlin_3_3(float3 p, float3 t) {
+    int4 w = ksg_period(float4(t, 0));
+    return float3(ksg_perlin3(p, 0, w), ksg_perlin3(p, 1, w), ksg_perlin3(p, 2, w));
+}
+float3 pperlin_3_4(float4 p, float4 t) {
+    int4 w = ksg_period(t);
+    return float3(ksg_perlin4(p, 0, w), ksg_perlin4(p, 1, w), ksg_perlin4(p, 2, w));
+}
+
+// Periodic cell and hash noise wrap the coordinates themselves into [0, period).
+float4 ksg_wrap_coord(float4 p, float4 period) {
+    float4 t = max(floor(period), 1.0);
+    return p - t * floor(p / t);
+}
+
+float pcellnoise_1_1(float1 p, float1 t) { return cellnoise_1_1(ksg_wrap_coord(float4(p.x, 0, 0, 0), float4(t.x, 1, 1, 1)).x); }
+float pcellnoise_1_2(float2 p, float2 t) { return cellnoise_1_2(ksg_wrap_coord(float4(p, 0, 0), float4(t, 1, 1)).xy); }
+float pcellnoise_1_3(float3 p, float3 t) { return cellnoise_1_3(ksg_wrap_coord(float4(p, 0), float4(t, 1)).xyz); }
+float pcellnoise_1_4(float4 p, float4 t) { return cellnoise_1_4(ksg_wrap_coord(p, t)); }
+float3 pcellnoise_3_1(float1 p, float1 t) { return cellnoise_3_1(ksg_wrap_coord(float4(p.x, 0, 0, 0), float4(t.x, 1, 1, 1)).x); }
+float3 pcellnoise_3_2(float2 p, float2 t) { return cellnoise_3_2(ksg_wrap_coord(float4(p, 0, 0), float4(t, 1, 1)).xy); }
+float3 pcellnoise_3_3(float3 p, float3 t) { return cellnoise_3_3(ksg_wrap_coord(float4(p, 0), float4(t, 1)).xyz); }
+float3 pcellnoise_3_4(float4 p, float4 t) { return cellnoise_3_4(ksg_wrap_coord(p, t)); }
+
+float phashnoise_1_1(float1 p, float1 t) { return hashnoise_1_1(ksg_wrap_coord(float4(p.x, 0, 0, 0), float4(t.x, 1, 1, 1)).x); }
+float phashnoise_1_2(float2 p, float2 t) { return hashnoise_1_2(ksg_wrap_coord(float4(p, 0, 0), float4(t, 1, 1)).xy); }
+float phashnoise_1_3(float3 p, float3 t) { return hashnoise_1_3(ksg_wrap_coord(float4(p, 0), float4(t, 1)).xyz); }
+float phashnoise_1_4(float4 p, float4 t) { return hashnoise_1_4(ksg_wrap_coord(p, t)); }
+float3 phashnoise_3_1(float1 p, float1 t) { return hashnoise_3_1(ksg_wrap_coord(float4(p.x, 0, 0, 0), float4(t.x, 1, 1, 1)).x); }
+float3 phashnoise_3_2(float2 p, float2 t) { return hashnoise_3_2(ksg_wrap_coord(float4(p, 0, 0), float4(t, 1, 1)).xy); }
+float3 phashnoise_3_3(float3 p, float3 t) { return hashnoise_3_3(ksg_wrap_coord(float4(p, 0), float4(t, 1)).xyz); }
+float3 phashnoise_3_4(float4 p, float4 t) { return hashnoise_3_4(ksg_wrap_coord(p, t)); }
 
 // ---- Simplex noise, signed; a vector result uses seeds seed, seed + 1 and seed + 2 ----
 
