@@ -9,16 +9,11 @@ namespace {
 
 const std::map<int, MSTR>& MapStrings() {
     static const std::map<int, MSTR> strings = {
-        {kResCategory, L"Tessel"},
-        {kResFixedBlockName, L"OSL Code"},
-        {kResOSLPath, L"Shader File"},
-        {kResUndoShaderChange, L"Change OSL Shader"},
-        {kResClassName, L"Tessel Map"},
-        {kResShaderBlockName, L"Tessel Map Parameters"},
-        {kResOSLCode, L"Shader Code"},
-        {kResOSLAutoUpdate, L"Auto-Update from File"},
-        {kResOSLShaderName, L"Shader Name"},
-        {kResOSLPresetName, L"Preset"},
+        {kResCategory, L"Tessel"},           {kResFixedBlockName, L"OSL Code"},
+        {kResOSLPath, L"Shader File"},       {kResUndoShaderChange, L"Change OSL Shader"},
+        {kResClassName, L"Tessel Map"},      {kResShaderBlockName, L"Tessel Map Parameters"},
+        {kResOSLCode, L"Shader Code"},       {kResOSLAutoUpdate, L"Auto-Update from File"},
+        {kResOSLShaderName, L"Shader Name"}, {kResOSLPresetName, L"Preset"},
     };
     return strings;
 }

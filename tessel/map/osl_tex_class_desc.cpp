@@ -31,17 +31,13 @@ MapClass& TheMapClass() {
         m->fixed = new ParamBlockDesc2(
             kFixedBlockID, L"params", 0, &m->desc, P_AUTO_CONSTRUCT | P_VERSION, 1, 1,
             // params
-            kOSLPath, L"OSLPath", TYPE_FILENAME, 0, kResOSLPath, p_default, L"", p_end,
-            kOSLCode, L"OSLCode", TYPE_STRING, 0, kResOSLCode, p_default,
-            FromUTF8(kExampleShader), p_end,
+            kOSLPath, L"OSLPath", TYPE_FILENAME, 0, kResOSLPath, p_default, L"", p_end, kOSLCode,
+            L"OSLCode", TYPE_STRING, 0, kResOSLCode, p_default, FromUTF8(kExampleShader), p_end,
             kOSLAutoUpdate, L"OSLAutoUpdate", TYPE_BOOL, 0, kResOSLAutoUpdate, p_default, false,
-            p_end,
-            kOSLShaderName, L"OSLShaderName", TYPE_STRING, P_READ_ONLY | P_TRANSIENT,
+            p_end, kOSLShaderName, L"OSLShaderName", TYPE_STRING, P_READ_ONLY | P_TRANSIENT,
             kResOSLShaderName, p_accessor, static_cast<PBAccessor*>(&PBShaderAccessor::Instance()),
-            p_end,
-            kOSLPresetName, L"OSLPresetName", TYPE_STRING, 0, kResOSLPresetName, p_default, L"",
-            p_end,
-            p_end);
+            p_end, kOSLPresetName, L"OSLPresetName", TYPE_STRING, 0, kResOSLPresetName, p_default,
+            L"", p_end, p_end);
         SetShaderBlockOwner(&m->desc);
         return m;
     }();

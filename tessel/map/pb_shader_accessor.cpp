@@ -3,8 +3,7 @@
 
 #include "map/osl_tex.h"
 
-void PBShaderAccessor::Get(PB2Value& v, ReferenceMaker* owner, ParamID, int, TimeValue,
-                           Interval&) {
+void PBShaderAccessor::Get(PB2Value& v, ReferenceMaker* owner, ParamID, int, TimeValue, Interval&) {
     if (auto* map = dynamic_cast<OSLTex*>(owner))
         v = PB2Value(map->GetShaderName());
     else

@@ -49,12 +49,11 @@ void AssignTimeValueControllers(IParamBlock2* block, SourceKey key) {
         if (registry.MetadataValue(key, ToUTF8(def.int_name), "timeValue").empty()) continue;
         auto* ctrl = dynamic_cast<Control*>(
             CreateInstance(CTRL_FLOAT_CLASS_ID, EXPR_FLOAT_CONTROL_CLASS_ID));
-        auto* expr = ctrl ? dynamic_cast<IExprCtrl*>(ctrl->GetInterface(IID_EXPR_CONTROL))
-                          : nullptr;
+        auto* expr =
+            ctrl ? dynamic_cast<IExprCtrl*>(ctrl->GetInterface(IID_EXPR_CONTROL)) : nullptr;
         if (!expr) {
             if (ctrl) ctrl->DeleteMe();
-            ReportError("No expression controller for the timeValue input " +
-                        ToUTF8(def.int_name));
+            ReportError("No expression controller for the timeValue input " + ToUTF8(def.int_name));
             continue;
         }
         const bool reportErrors = expr->GetReportErrors();
@@ -119,9 +118,8 @@ bool UpdateShader(OSLTex& map, bool loading) {
     map.shadingSystem_ = GetShadingSystem(registry);
     if (!map.fixedBlock_) return false;
 
-    ShaderBlockRestore* record = map.blockSwapUndoable_ && theHold.Holding()
-                                     ? new ShaderBlockRestore(map)
-                                     : nullptr;
+    ShaderBlockRestore* record =
+        map.blockSwapUndoable_ && theHold.Holding() ? new ShaderBlockRestore(map) : nullptr;
     const std::string code = ToUTF8(map.fixedBlock_->GetStr(kOSLCode, 0));
     const SourceKey key = registry.SourceKeyOf(code);
     map.key_ = key;
@@ -162,8 +160,8 @@ bool UpdateShader(OSLTex& map, bool loading) {
     return true;
 }
 
-void RebuildShaderBlock(OSLTex& map, IParamBlock2* oldBlock,
-                        std::shared_ptr<ParamBlockDesc2> desc, SourceKey key, bool skipValues) {
+void RebuildShaderBlock(OSLTex& map, IParamBlock2* oldBlock, std::shared_ptr<ParamBlockDesc2> desc,
+                        SourceKey key, bool skipValues) {
     BlockKeeper keepOld(oldBlock);
     theHold.Suspend();
     IParamBlock2* block = CreateParameterBlock2(desc.get(), &map);
@@ -252,9 +250,8 @@ void InitArrayDefaults(SourceKey key, IParamBlock2* block) {
             break;
         case TYPE_POINT3_TAB: {
             const auto& d = p->fdefault;
-            fill(d.size() / 3, [&](size_t k) {
-                return Point3(d[3 * k], d[3 * k + 1], d[3 * k + 2]);
-            });
+            fill(d.size() / 3,
+                 [&](size_t k) { return Point3(d[3 * k], d[3 * k + 1], d[3 * k + 2]); });
             break;
         }
         case TYPE_STRING_TAB:
@@ -274,9 +271,8 @@ void InitArrayDefaults(SourceKey key, IParamBlock2* block) {
         }
         case TYPE_POINT4_TAB: {
             const auto &x = field(1), &y = field(2), &z = field(3), &w = field(4);
-            fill(std::min({x.size(), y.size(), z.size(), w.size()}), [&](size_t k) {
-                return Point4(x[k], y[k], z[k], w[k]);
-            });
+            fill(std::min({x.size(), y.size(), z.size(), w.size()}),
+                 [&](size_t k) { return Point4(x[k], y[k], z[k], w[k]); });
             break;
         }
         case TYPE_FRGBA_TAB:
@@ -287,9 +283,8 @@ void InitArrayDefaults(SourceKey key, IParamBlock2* block) {
                 });
             } else {
                 const auto& d = p->fdefault;
-                fill(d.size() / 3, [&](size_t k) {
-                    return AColor(d[3 * k], d[3 * k + 1], d[3 * k + 2], 1.0f);
-                });
+                fill(d.size() / 3,
+                     [&](size_t k) { return AColor(d[3 * k], d[3 * k + 1], d[3 * k + 2], 1.0f); });
             }
             break;
         case TYPE_POINT2_TAB: {

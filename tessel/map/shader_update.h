@@ -16,8 +16,8 @@ class OSLTex;
 bool UpdateShader(OSLTex& map, bool loading);
 
 // Replaces the map's shader block by a new one made from desc; undo is suspended meanwhile.
-void RebuildShaderBlock(OSLTex& map, IParamBlock2* oldBlock,
-                        std::shared_ptr<ParamBlockDesc2> desc, SourceKey key, bool skipValues);
+void RebuildShaderBlock(OSLTex& map, IParamBlock2* oldBlock, std::shared_ptr<ParamBlockDesc2> desc,
+                        SourceKey key, bool skipValues);
 
 // Copies controllers, connected maps and (unless skipValues) values from old to new for every
 // parameter of new whose name and host type old has too. False when no copy pass ran.
