@@ -109,7 +109,10 @@ TEST(ReferenceCorpus, EveryFileTranslatesAndCompilesOrFailsWithAMessage) {
     std::cout << report.str();
     RecordProperty("translated", translated);
     RecordProperty("failed", failed);
-    EXPECT_GT(translated, 0);
+    // 702 of the 738 files translated when the precompute pass, select and periodic noise came
+    // in; the rest use closures, environment lookups, run-time array lengths or other ops the
+    // viewport cannot show. Fewer means a regression.
+    EXPECT_GE(translated, 702);
 }
 
 } // namespace
