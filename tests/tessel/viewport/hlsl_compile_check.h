@@ -10,8 +10,10 @@
 #include <atomic>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <sstream>
 #include <string>
 #include <unistd.h>
@@ -141,7 +143,9 @@ struct CompileResult {
 // shaders are small.
 enum class Legalize { Yes, No };
 
-inline CompileResult CompileHLSL(const std::string& shader, Legalize legalize = Legalize::Yes) {
+// With `spirv` the compiled module is read back into it.
+inline CompileResult CompileHLSL(const std::string& shader, Legalize legalize = Legalize::Yes,
+                                 std::vector<uint32_t>* spirv = nullptr) {
     static std::atomic<int> counter{0};
     const std::filesystem::path dir =
         std::filesystem::temp_directory_path() / ("tessel_viewport_" + std::to_string(getpid()));
@@ -160,10 +164,21 @@ inline CompileResult CompileHLSL(const std::string& shader, Legalize legalize = 
     std::ostringstream text;
     text << log.rdbuf();
     result.log = text.str();
+    if (spirv && result.ok) {
+        std::ifstream module(stem + ".spv", std::ios::binary);
+        const std::string bytes{std::istreambuf_iterator<char>(module),
+                                std::istreambuf_iterator<char>()};
+        spirv->resize(bytes.size() / sizeof(uint32_t));
+        std::memcpy(spirv->data(), bytes.data(), spirv->size() * sizeof(uint32_t));
+    }
     std::filesystem::remove(stem + ".hlsl");
     std::filesystem::remove(stem + ".spv");
     std::filesystem::remove(stem + ".log");
     return result;
+}
+
+inline CompileResult CompileHLSLToSPIRV(const std::string& shader, std::vector<uint32_t>& spirv) {
+    return CompileHLSL(shader, Legalize::Yes, &spirv);
 }
 
 // Compiles the text mode outputs of several translations in one shader; a failure carries the
