@@ -2,6 +2,7 @@
 // forms.
 #include "kernels_registry.h"
 
+#include "gabor_noise.h"
 #include "noise_cell_hash.h"
 #include "noise_perlin.h"
 #include "noise_simplex.h"
@@ -174,13 +175,10 @@ void evalConstant(ExecState& st, const Operand& R, float v, int nchan) {
     storeValues(st, R, r, nchan);
 }
 
-// Gabor noise named by a constant belongs to the gabor family's own kernels; one named by a
-// string known only while shading cannot reach them from here.
-void evalGabor(ExecState& st, const Instr& in, const NoiseInputs& ni) {
-    evalConstant(st, in.args[0], 0.0f, ni.nchan);
-    shaderError(st, in,
-                "gabor noise needs its type name to be a constant string; it was chosen "
-                "while shading");
+// Gabor noise named by a constant gets the gabor family's own kernel; named by a string known
+// only while shading, it is handed over here.
+void evalGabor(ExecState& st, const Instr& in) {
+    execGaborNoise(st, in);
 }
 
 void kNoise(ExecState& st, const Instr& in) {
@@ -217,7 +215,7 @@ void kNoise(ExecState& st, const Instr& in) {
         evalConstant(st, R, 0.5f, ni.nchan);
         break;
     case NoiseKind::Gabor:
-        evalGabor(st, in, ni);
+        evalGabor(st, in);
         break;
     default:
         evalConstant(st, R, 0.0f, ni.nchan);
