@@ -102,13 +102,14 @@ inline Dual<T, P> operator*(const T& b, const Dual<T, P>& a) {
     return a * b;
 }
 // Quotient rule; a zero denominator gives zero for the value and the derivatives, as OSL
-// defines division.
+// defines division. The value is a true quotient (not a times 1/b) so that it has the same bits
+// as the division without derivatives.
 template <class T, int P>
 inline Dual<T, P> operator/(const Dual<T, P>& a, const Dual<T, P>& b) {
     Dual<T, P> r;
     if (b.elem(0) == T(0)) return r;
     const T inv = T(1) / b.elem(0);
-    r.elem(0) = a.elem(0) * inv;
+    r.elem(0) = a.elem(0) / b.elem(0);
     for (int i = 1; i < P + 1; ++i) r.elem(i) = (a.elem(i) - r.elem(0) * b.elem(i)) * inv;
     return r;
 }
