@@ -1,5 +1,6 @@
 // The interpreter: walks a program's instructions, runs layers (entry layers eagerly, upstream
 // layers lazily at the first read of a connected input) and copies values along connections.
+#include "debug_checks.h"
 #include "shading_context.h"
 #include "shading_system_impl.h"
 
@@ -111,24 +112,57 @@ void resolveUses(ExecState& st, const Instr& in) {
         ctx.paramResolved[k] = 1;
         for (int ci : prog.connectedParams[k].sources) {
             const ConnectionCopy& cc = prog.copies[ci];
-            runLayer(st, cc.srcLayer);
+            if (!ctx.layerRan[cc.srcLayer]) runLayer(st, cc.srcLayer);
             for (int plane = 0; plane < 3; ++plane) copyPlane(st, cc, plane);
         }
     }
 }
 
+namespace {
+
+// One line of the layer trace, kept in order with the shader's own output.
+void traceLayer(ExecState& st, const char* what, int layer) {
+    const ShaderInstance& inst = st.prog->group->layers[size_t(layer)];
+    std::string& out = st.ctx->output;
+    out += "(node ";
+    out += inst.layername.string();
+    out += ") ";
+    out += what;
+    out += ' ';
+    out += std::to_string(layer);
+    out += ' ';
+    out += inst.layername.string();
+    out += ' ';
+    out += inst.master->name.string();
+    out += '\n';
+}
+
+} // namespace
+
 void runLayer(ExecState& st, int layer) {
     ShadingContext& ctx = *st.ctx;
+    const Program& prog = *st.prog;
+    const ProgramLayer& pl = prog.layers[layer];
+    if (prog.traceLayers && pl.isEntry) {
+        traceLayer(st, "checking for already-run layer", layer);
+        if (ctx.layerRan[layer])
+            traceLayer(st, "  taking early exit, already executed layer", layer);
+    }
     if (ctx.layerRan[layer]) return;
     ctx.layerRan[layer] = 1;
-    const ProgramLayer& pl = st.prog->layers[layer];
-    std::memcpy(st.heap + pl.regionBegin, st.prog->initImage.data() + pl.regionBegin,
+    if (prog.traceLayers) traceLayer(st, "enter layer", layer);
+    // The group's entry (its last layer unless entries are named) first runs the layers that
+    // always run, then its own code.
+    if (prog.entryOrder.empty() && layer == int(prog.layers.size()) - 1)
+        for (size_t l = 0; l + 1 < prog.layers.size(); ++l)
+            if (prog.layers[l].runsEagerly && !ctx.layerRan[l]) runLayer(st, int(l));
+    std::memcpy(st.heap + pl.regionBegin, prog.initImage.data() + pl.regionBegin,
                 pl.regionEnd - pl.regionBegin);
     if (!pl.userdata.empty()) {
         RendererServices* rs = ctx.system->renderer;
         for (const UserdataParam& u : pl.userdata)
             if (rs && !rs->get_userdata(u.value.derivs, u.name, u.value.type, st.sg, st.p(u.value)))
-                std::memcpy(st.p(u.value), st.prog->initImage.data() + u.value.offset,
+                std::memcpy(st.p(u.value), prog.initImage.data() + u.value.offset,
                             u.value.size * (u.value.derivs ? 3 : 1));
     }
     const uint8_t savedStatus = ctx.status;
@@ -142,6 +176,7 @@ void runLayer(ExecState& st, int layer) {
     runRange(st, pl.mainBegin, pl.mainEnd);
     ctx.status = savedStatus;
     ctx.currentLayer = savedLayer;
+    if (prog.traceLayers) traceLayer(st, "exit layer", layer);
 }
 
 void runRange(ExecState& st, int begin, int end) {
@@ -152,7 +187,11 @@ void runRange(ExecState& st, int begin, int end) {
         if (in.useCount) resolveUses(st, in);
         switch (in.flow) {
         case Flow::Plain:
+            if (st.prog->debugUninit) [[unlikely]]
+                checkUninitializedReads(st, in);
             in.fn(st, in);
+            if (st.prog->debugNan) [[unlikely]]
+                checkNonFiniteWrites(st, in);
             ++ip;
             break;
         case Flow::If:
@@ -299,15 +338,17 @@ void loadGlobals(ExecState& st, const ShaderGlobals& sg) {
 
 } // namespace
 
-bool ShadingSystemImpl::execute(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& sg,
-                                bool run) {
+bool ShadingSystemImpl::executeInit(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& sg,
+                                    bool run) {
     if (!group.program) {
         error("execute: shader group \"" + group.name.string() + "\" is not ready to run" +
               (group.buildError.empty() ? std::string() : ": " + group.buildError));
+        ctx.prog = nullptr;
         return false;
     }
     const Program& prog = *group.program;
     if (ctx.boundSerial != prog.serial) ctx.bind(prog);
+    ctx.prog = &prog;
     std::fill(ctx.layerRan.begin(), ctx.layerRan.end(), 0);
     std::fill(ctx.paramResolved.begin(), ctx.paramResolved.end(), 0);
     ctx.closures.reset();
@@ -315,17 +356,42 @@ bool ShadingSystemImpl::execute(ShadingContext& ctx, ShaderGroup& group, ShaderG
     ctx.sg = &sg;
     ctx.status = Running;
     sg.context = &ctx;
-    if (!run) return true;
-    ExecState st{ctx.heap, &ctx, &sg, &prog};
-    loadGlobals(st, sg);
-    for (size_t l = 0; l < prog.layers.size(); ++l)
-        if (prog.layers[l].runsEagerly) runLayer(st, int(l));
-    if (prog.hasCi) sg.Ci = *reinterpret_cast<ClosureColor**>(ctx.heap + prog.ciOffset);
+    if (run) {
+        ExecState st{ctx.heap, &ctx, &sg, &prog};
+        loadGlobals(st, sg);
+    }
+    return true;
+}
+
+bool ShadingSystemImpl::executeLayer(ShadingContext& ctx, int layer) {
+    if (!ctx.prog || layer < 0 || layer >= int(ctx.prog->layers.size())) return false;
+    ExecState st{ctx.heap, &ctx, ctx.sg, ctx.prog};
+    runLayer(st, layer);
+    return true;
+}
+
+bool ShadingSystemImpl::executeCleanup(ShadingContext& ctx) {
+    if (!ctx.prog) return false;
+    if (ctx.prog->hasCi && ctx.sg)
+        ctx.sg->Ci = *reinterpret_cast<ClosureColor**>(ctx.heap + ctx.prog->ciOffset);
     if (!ctx.output.empty()) {
         message(ctx.output);
         ctx.output.clear();
     }
     return true;
+}
+
+bool ShadingSystemImpl::execute(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& sg,
+                                bool run) {
+    if (!executeInit(ctx, group, sg, run)) return false;
+    if (!run) return true;
+    const Program& prog = *ctx.prog;
+    if (prog.entryOrder.empty()) {
+        executeLayer(ctx, int(prog.layers.size()) - 1);
+    } else {
+        for (int l : prog.entryOrder) executeLayer(ctx, l);
+    }
+    return executeCleanup(ctx);
 }
 
 } // namespace OSL

@@ -5,6 +5,7 @@
 #include <OpenImageIO/filesystem.h>
 #include <OpenImageIO/strutil.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <sstream>
 
@@ -79,7 +80,10 @@ bool addShader(ShadingSystemImpl& sys, ShaderGroup& g, string_view usage, string
     ShaderInstance inst;
     inst.master = master;
     inst.usage = ustring(usage);
-    inst.layername = layername.empty() ? name : ustring(layername);
+    // An unnamed layer is known by its shader and position, as "shader_N".
+    inst.layername = layername.empty()
+                         ? ustring(name.string() + "_" + std::to_string(g.layers.size()))
+                         : ustring(layername);
     for (PendingParameter& p : g.pending) {
         int sym = master->findSymbol(p.name);
         if (sym < 0 || !master->symbols[size_t(sym)].isParam()) {
@@ -213,8 +217,79 @@ bool connectShaders(ShadingSystemImpl& sys, ShaderGroup& g, string_view srclayer
     return true;
 }
 
+void computeNeeds(ShaderGroup& g) {
+    ShaderGroup::Needs n;
+    auto addUnique = [](std::vector<ustring>& v, ustring s) {
+        if (std::find(v.begin(), v.end(), s) == v.end()) v.push_back(s);
+    };
+    for (const ShaderInstance& inst : g.layers) {
+        const ShaderMaster& m = *inst.master;
+        for (const MasterSymbol& s : m.symbols)
+            if (s.symtype == SymTypeGlobal && (s.firstRead >= 0 || s.firstWrite >= 0))
+                addUnique(n.globals, s.name);
+        auto constString = [&](int argIndex, ustring& out) {
+            const int sym = m.args[size_t(argIndex)];
+            if (sym < 0) return false;
+            const MasterSymbol& s = m.symbols[size_t(sym)];
+            if (s.symtype != SymTypeConst || !s.type.is_string() || s.sdefaults.empty())
+                return false;
+            out = s.sdefaults[0];
+            return true;
+        };
+        for (const MasterOp& op : m.ops) {
+            const std::string_view name = op.opname.string();
+            if (name == "backfacing") {
+                // Which side faces the viewer follows from the incoming ray and the normal.
+                addUnique(n.globals, ustring("I"));
+                addUnique(n.globals, ustring("N"));
+            } else if (name == "getattribute") {
+                const int last = op.firstArg + op.nargs - 1;
+                const bool indexed = m.symbols[size_t(m.args[size_t(last - 1)])].type.is_int();
+                const int args = op.nargs - (indexed ? 1 : 0);
+                ustring obj, attr;
+                bool ok;
+                if (args == 4)
+                    ok = constString(op.firstArg + 1, obj) && constString(op.firstArg + 2, attr);
+                else
+                    ok = constString(op.firstArg + 1, attr);
+                if (!ok) {
+                    n.unknownAttributes = true;
+                    continue;
+                }
+                bool seen = false;
+                for (size_t k = 0; k < n.attributes.size(); ++k)
+                    if (n.attributes[k] == attr && n.scopes[k] == obj) seen = true;
+                if (!seen) n.attributes.push_back(attr), n.scopes.push_back(obj);
+            } else if (name == "texture" || name == "texture3d" || name == "environment" ||
+                       name == "gettextureinfo") {
+                ustring file;
+                if (constString(op.firstArg + 1, file))
+                    addUnique(n.textures, file);
+                else
+                    n.unknownTextures = true;
+            } else if (name == "closure") {
+                ustring cname;
+                if (constString(op.firstArg + 1, cname) || constString(op.firstArg + 2, cname))
+                    addUnique(n.closures, cname);
+                else
+                    n.unknownClosures = true;
+            }
+        }
+    }
+    std::sort(n.globals.begin(), n.globals.end(),
+              [](ustring a, ustring b) { return a.string() < b.string(); });
+    g.needs = std::move(n);
+}
+
 bool endGroup(ShadingSystemImpl& sys, ShaderGroup& g) {
     g.ended = true;
+    computeNeeds(g);
+    // A group may end empty (a renderer starting over); it simply has nothing to run.
+    if (g.layers.empty()) {
+        g.program.reset();
+        g.buildError = "shader group has no layers";
+        return true;
+    }
     std::string error;
     g.program = buildProgram(sys, g, error);
     if (!g.program) {

@@ -274,6 +274,24 @@ struct Linearstep {
     }
     static float v(float e0, float e1, float x) { return d(D2(e0), D2(e1), D2(x)).val(); }
 };
+// linearstep with its corners rounded over a width of eps on each side of both edges.
+struct SmoothLinearstep {
+    static D2 d(const D2& e0, const D2& e1, const D2& x_, const D2& eps_) {
+        if (e0.val() == e1.val()) return D2(x_.val() < e0.val() ? 0.0f : 1.0f);
+        const D2 widthInv = D2(1.0f) / (e1 - e0);
+        const D2 eps = eps_ * widthInv;
+        const D2 x = (x_ - e0) * widthInv;
+        auto rampup = [](const D2& t, const D2& r) { return D2(0.5f) / r * t * t; };
+        if (x.val() <= -eps.val()) return D2(0.0f);
+        if (x.val() >= eps.val() && x.val() <= 1.0f - eps.val()) return x;
+        if (x.val() >= 1.0f + eps.val()) return D2(1.0f);
+        if (x.val() < eps.val()) return rampup(x + eps, D2(2.0f) * eps);
+        return D2(1.0f) - rampup(D2(1.0f) + eps - x, D2(2.0f) * eps);
+    }
+    static float v(float e0, float e1, float x, float eps) {
+        return d(D2(e0), D2(e1), D2(x), D2(eps)).val();
+    }
+};
 struct Select {
     static D2 d(const D2& a, const D2& b, const D2& c) { return c.val() != 0.0f ? b : a; }
     static float v(float a, float b, float c) { return c != 0.0f ? b : a; }
@@ -293,6 +311,36 @@ void kTer(ExecState& st, const Instr& in) {
             r[c] = F::v(st.comp(in.args[1], c), st.comp(in.args[2], c), st.comp(in.args[3], c));
     }
 }
+template <class F, bool D>
+void kQuad(ExecState& st, const Instr& in) {
+    const Operand& R = in.args[0];
+    const int n = R.ncomp;
+    if constexpr (D) {
+        for (int c = 0; c < n; ++c)
+            st.store(R, c,
+                     F::d(st.dual(in.args[1], c), st.dual(in.args[2], c), st.dual(in.args[3], c),
+                          st.dual(in.args[4], c)));
+    } else {
+        float* r = st.f(R);
+        for (int c = 0; c < n; ++c)
+            r[c] = F::v(st.comp(in.args[1], c), st.comp(in.args[2], c), st.comp(in.args[3], c),
+                        st.comp(in.args[4], c));
+    }
+}
+
+// log(x, base): the natural logarithms' quotient, 0 where the base's logarithm is 0.
+struct LogBase {
+    static D2 d(const D2& x, const D2& b) {
+        const D2 lb = Log::d(b);
+        if (lb.val() == 0.0f) return D2(0.0f);
+        return Log::d(x) / lb;
+    }
+    static float v(float x, float b) {
+        const float lb = Log::v(b);
+        return lb == 0.0f ? 0.0f : Log::v(x) / lb;
+    }
+};
+
 void kClampInt(ExecState& st, const Instr& in) {
     const int x = st.integer(in.args[1]), lo = st.integer(in.args[2]), hi = st.integer(in.args[3]);
     *st.i(in.args[0]) = x < lo ? lo : (x > hi ? hi : x);
@@ -542,6 +590,11 @@ int selectMathKernel(KernelChoice& k) {
         for (const auto& e : unary)
             if (op == e.first) return e.second(k), 1;
     }
+    if (op == "log" && n == 3) return pickBinaryFloat<LogBase>(k), 1;
+    if (op == "smooth_linearstep" && n == 5)
+        return k.in.fn =
+                   k.arg(0).derivs ? kQuad<SmoothLinearstep, true> : kQuad<SmoothLinearstep, false>,
+               1;
     if (op == "sincos" && n == 3) return k.in.fn = kSincos, 1;
     if (op == "mix" && n == 4) return pickTernary<Mix>(k), 1;
     if (op == "clamp" && n == 4) {

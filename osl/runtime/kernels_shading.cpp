@@ -26,13 +26,18 @@ void kClosure(ExecState& st, const Instr& in) {
         const TypeDesc t = p.type;
         if (t.basetype == TypeDesc::STRING && o.isString) {
             std::memcpy(dst, st.p(o), std::min<size_t>(size_t(p.field_size), o.size));
-        } else if (t.basetype == TypeDesc::INT) {
-            *reinterpret_cast<int*>(dst) = st.integer(o);
-        } else if (t.basetype == TypeDesc::FLOAT) {
-            const int n =
-                std::min<int>(p.field_size / 4, int(t.aggregate) * std::max(1, t.arraylen));
-            for (int c = 0; c < n; ++c)
-                reinterpret_cast<float*>(dst)[c] = o.isInt ? float(*st.i(o)) : st.comp(o, c);
+        } else if (t.basetype == TypeDesc::INT || t.basetype == TypeDesc::FLOAT) {
+            // Whole values, arrays included; a single number fills every slot.
+            const int n = p.field_size / 4;
+            const int have = std::max<int>(1, int(o.size / 4));
+            for (int c = 0; c < n; ++c) {
+                const int from = have == 1 ? 0 : std::min(c, have - 1);
+                const float fv = o.isInt ? float(st.i(o)[from]) : st.f(o)[from];
+                if (t.basetype == TypeDesc::INT)
+                    reinterpret_cast<int*>(dst)[c] = o.isInt ? st.i(o)[from] : int(fv);
+                else
+                    reinterpret_cast<float*>(dst)[c] = fv;
+            }
         } else if (t.basetype == TypeDesc::PTR && o.isClosure) {
             std::memcpy(dst, st.p(o), sizeof(void*));
         }

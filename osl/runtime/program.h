@@ -89,6 +89,7 @@ struct ProgramLayer {
     std::vector<std::pair<int, int>> initRanges; // param init code to run at layer start
     uint32_t regionBegin = 0, regionEnd = 0;     // bytes of the heap reset at layer start
     bool runsEagerly = false;
+    bool isEntry = false; // named as an entry layer: checks on every call whether it ran
     int firstSymbol = 0, symbolCount = 0;
 };
 
@@ -140,14 +141,26 @@ struct Program {
     std::vector<ConnectionCopy> copies;
     std::vector<ShaderSymbol> symbols;
     std::vector<GlobalSlot> globals;
-    std::vector<char> initImage; // the heap's starting contents: constants, defaults, zeros
+    // The heap's starting contents: constants, defaults, zeros. Written when the program is
+    // built and by ReParameter, which callers must not overlap with executions; executing
+    // threads only read it.
+    std::vector<char> initImage;
     uint32_t heapSize = 0;
     uint32_t ciOffset = 0;
     bool hasCi = false;
     uint64_t serial = 0; // unique per program, so contexts know when to rebind
+    // The named entry layers in the order given; empty when the last layer is the entry.
+    std::vector<int> entryOrder;
+    bool traceLayers = false; // report entering and leaving layers with the shader output
+    bool debugNan = false, debugUninit = false;
+    std::vector<std::vector<int>> reportedOps; // per layer, when debugUninit: see debug_checks.h
     const ShaderGroup* group = nullptr;
     ShadingSystemImpl* system = nullptr;
 };
+
+// Writes a parameter's starting value (the instance value when given, else the default) into
+// its storage of type t.
+void writeValue(char* dst, TypeDesc t, const MasterSymbol& s, const InstanceValue* iv);
 
 // Builds the program of an ended group; on failure returns null with the reason in `error`.
 std::unique_ptr<Program> buildProgram(ShadingSystemImpl& system, const ShaderGroup& group,

@@ -1,9 +1,11 @@
 // Turns an ended shader group into its Program: decides which symbols carry derivatives, lays
 // every symbol out in the heap, resolves operands and kernels, and records connections and
 // which layers run eagerly.
+#include "debug_checks.h"
 #include "kernels.h"
 #include "shading_system_impl.h"
 
+#include <algorithm>
 #include <atomic>
 #include <cstring>
 #include <set>
@@ -60,6 +62,12 @@ Operand makeOperand(TypeDesc t, uint32_t offset, bool derivs) {
     return o;
 }
 
+uint32_t align8(uint32_t x) {
+    return (x + 7u) & ~7u;
+}
+
+} // namespace
+
 // Writes a parameter's value (instance value, else default) in storage form.
 void writeValue(char* dst, TypeDesc t, const MasterSymbol& s, const InstanceValue* iv) {
     const TypeDesc el = t.elementtype();
@@ -102,12 +110,6 @@ void writeValue(char* dst, TypeDesc t, const MasterSymbol& s, const InstanceValu
         }
     }
 }
-
-uint32_t align8(uint32_t x) {
-    return (x + 7u) & ~7u;
-}
-
-} // namespace
 
 std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup& group,
                                       std::string& error) {
@@ -404,7 +406,7 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
             pl.runsEagerly = l == nlayers - 1;
         else
             for (ustring e : group.entryLayers)
-                if (e == inst.layername) pl.runsEagerly = true;
+                if (e == inst.layername) pl.runsEagerly = pl.isEntry = true;
         for (const MasterSymbol& ms : inst.master->symbols)
             if (ms.isOutput())
                 for (ustring ro : group.rendererOutputs)
@@ -413,15 +415,72 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
                         pl.runsEagerly = true;
         // A layer that writes globals (Ci, N...) runs up front, so that downstream layers see
         // what it wrote whether or not they read one of its outputs.
+        // Branches on a parameter whose value is fixed for the group cannot be taken (the
+        // reference folds them away), so their writes do not count.
+        const ShaderMaster& m = *inst.master;
+        auto fixedCondition = [&](int sym, bool& value) {
+            const MasterSymbol& ms = m.symbols[size_t(sym)];
+            const bool constant = ms.symtype == SymTypeConst;
+            if (!constant) {
+                if (!ms.isParam() || ms.isOutput() || ms.initBegin >= 0 || isConnectedParam(l, sym))
+                    return false;
+                const InstanceValue* iv = inst.valueFor(sym);
+                if (iv ? !iv->lockgeom : !ms.lockgeom) return false;
+            }
+            if (!place[l][size_t(sym)].storage) return false;
+            const char* at = prog->initImage.data() + place[l][size_t(sym)].offset;
+            const TypeDesc t = symType[l][size_t(sym)];
+            if (t == TypeInt)
+                value = *reinterpret_cast<const int*>(at) != 0;
+            else if (t == TypeFloat)
+                value = *reinterpret_cast<const float*>(at) != 0.0f;
+            else
+                return false;
+            return true;
+        };
+        std::vector<uint8_t> dead(m.ops.size(), 0);
+        for (size_t k = 0; k < m.ops.size(); ++k) {
+            const MasterOp& op = m.ops[k];
+            bool value = false;
+            if (dead[k] || op.opname != "if" || op.nargs < 1 ||
+                !fixedCondition(m.args[size_t(op.firstArg)], value))
+                continue;
+            const size_t from = value ? size_t(op.jump[0]) : k + 1;
+            const size_t to = value ? size_t(op.jump[1]) : size_t(op.jump[0]);
+            for (size_t j = from; j < to && j < dead.size(); ++j) dead[j] = 1;
+        }
         bool writesGlobals = false;
-        for (const MasterSymbol& ms : inst.master->symbols)
-            if (ms.symtype == SymTypeGlobal && ms.firstWrite >= 0 && ms.firstWrite <= ms.lastWrite)
-                writesGlobals = true;
+        for (size_t k = 0; k < m.ops.size() && !writesGlobals; ++k) {
+            const MasterOp& op = m.ops[k];
+            for (int a = 0; a < op.nargs && !dead[k]; ++a) {
+                const int sym = m.args[size_t(op.firstArg + a)];
+                if (sym >= 0 && (op.argWrite & (1u << a)) &&
+                    m.symbols[size_t(sym)].symtype == SymTypeGlobal)
+                    writesGlobals = true;
+            }
+        }
         bool feedsOthers = false;
         for (const Connection& c : group.connections)
             if (c.src.layer == l) feedsOthers = true;
-        if (writesGlobals && feedsOthers) pl.runsEagerly = true;
+        if (writesGlobals && (feedsOthers || !sys.lazyGlobals)) pl.runsEagerly = true;
         if (!sys.lazyLayers) pl.runsEagerly = true;
+    }
+    for (ustring e : group.entryLayers) {
+        const int l = group.findLayer(e);
+        if (l < 0) {
+            error = "entry layer \"" + e.string() + "\" is not a layer of the group";
+            return nullptr;
+        }
+        if (std::find(prog->entryOrder.begin(), prog->entryOrder.end(), l) ==
+            prog->entryOrder.end())
+            prog->entryOrder.push_back(l);
+    }
+    prog->traceLayers = sys.debugLayers != 0;
+    prog->debugNan = sys.debugNan != 0;
+    prog->debugUninit = sys.debugUninit != 0;
+    if (prog->debugUninit) {
+        markUninitialized(*prog);
+        for (int l = 0; l < nlayers; ++l) prog->reportedOps.push_back(reportedOpNumbers(group, l));
     }
     return prog;
 }

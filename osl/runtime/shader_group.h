@@ -71,6 +71,12 @@ public:
     // Built at ShaderGroupEnd; read-only afterwards, shared by every thread that executes.
     std::unique_ptr<Program> program;
     std::string buildError;
+    // What the group reads, computed at ShaderGroupEnd so that the "*_needed" attributes can
+    // hand out pointers to these arrays, as renderers expect; read-only afterwards.
+    struct Needs {
+        std::vector<ustring> globals, attributes, scopes, textures, closures;
+        bool unknownAttributes = false, unknownTextures = false, unknownClosures = false;
+    } needs;
 
     int findLayer(ustring layername) const;
 };

@@ -45,6 +45,7 @@ struct MasterOp {
     int firstArg = 0, nargs = 0;
     int jump[4] = {-1, -1, -1, -1};
     uint32_t argWrite = 0;  // bit i: argument i is written
+    uint32_t argRead = 0;   // bit i: argument i is read
     uint32_t argDerivs = 0; // bit i: argument i's derivatives are taken
     ustring sourcefile;
     int line = 0;

@@ -105,8 +105,10 @@ public:
                 op.line = m_line;
             } else if (hintBody(h, "%argrw", body)) {
                 body = unquote(body);
-                for (size_t i = 0; i < body.size() && i < 32; ++i)
+                for (size_t i = 0; i < body.size() && i < 32; ++i) {
                     if (body[i] == 'w' || body[i] == 'W') op.argWrite |= 1u << i;
+                    if (body[i] == 'r' || body[i] == 'W') op.argRead |= 1u << i;
+                }
             } else if (hintBody(h, "%argderivs", body)) {
                 for (const std::string& p : splitTopLevel(body))
                     if (!p.empty()) op.argDerivs |= 1u << std::atoi(p.c_str());

@@ -63,6 +63,7 @@ public:
     std::string output;  // printf text of the current execute, flushed at its end
     std::string scratch; // format buffer
     ShaderGlobals* sg = nullptr;
+    const Program* prog = nullptr; // of the group being executed, set by execute_init
     uint8_t status = Running;
     int currentLayer = -1;
     std::vector<std::string> errorsSeen;

@@ -8,6 +8,7 @@
 #include <OpenImageIO/texture.h>
 
 #include <atomic>
+#include <cctype>
 #include <set>
 
 namespace OSL {
@@ -36,6 +37,9 @@ ShadingSystemImpl::ShadingSystemImpl(RendererServices* r, TextureSystem* ts, Err
     : renderer(r), texsys(ts), err(e ? e : &defaultHandler()) {
     if (!texsys) {
         texsys = TextureSystem::create(true);
+        // Plain scanline images are mipmapped and tiled on first use, as OSL's own default does.
+        texsys->attribute("automip", 1);
+        texsys->attribute("autotile", 64);
         ownsTexsys = true;
     }
     if (!renderer) {
@@ -92,15 +96,16 @@ bool ShadingSystem::attribute(string_view name, TypeDesc type, const void* val) 
             {"error_repeats", &ShadingSystemImpl::errorRepeats},
             {"lazylayers", &ShadingSystemImpl::lazyLayers},
             {"countlayerexecs", &ShadingSystemImpl::countLayerExecs},
-            {"greedyjit", &ShadingSystemImpl::greedyJit}};
+            {"greedyjit", &ShadingSystemImpl::greedyJit},
+            {"lazyglobals", &ShadingSystemImpl::lazyGlobals},
+            {"llvm_debug_layers", &ShadingSystemImpl::debugLayers}};
         for (const auto& e : ints)
             if (name == e.first) {
                 s.*(e.second) = v;
                 return true;
             }
         // Options of the reference's JIT and optimiser that have no meaning for this executor.
-        static const char* accepted[] = {"lazyglobals",
-                                         "lazyunconnected",
+        static const char* accepted[] = {"lazyunconnected",
                                          "lazy_userdata",
                                          "userdata_isconnected",
                                          "llvm_optimize",
@@ -170,76 +175,15 @@ bool ShadingSystem::getattribute(string_view name, TypeDesc type, void* val) {
 
 namespace {
 
-// Names read by the group, for the "*_needed" group attributes.
-struct GroupNeeds {
-    std::vector<ustring> globals, attributes, scopes, textures, closures;
-    bool unknownAttributes = false, unknownTextures = false;
-};
-
-GroupNeeds analyseNeeds(const ShaderGroup& g, const ShadingSystemImpl& sys) {
-    GroupNeeds n;
-    auto addUnique = [](std::vector<ustring>& v, ustring s) {
-        if (std::find(v.begin(), v.end(), s) == v.end()) v.push_back(s);
-    };
-    for (const ShaderInstance& inst : g.layers) {
-        const ShaderMaster& m = *inst.master;
-        for (const MasterSymbol& s : m.symbols)
-            if (s.symtype == SymTypeGlobal && (s.firstRead >= 0 || s.firstWrite >= 0) &&
-                s.firstRead <= s.lastRead && s.lastRead >= 0)
-                addUnique(n.globals, s.name);
-        auto constString = [&](int argIndex, ustring& out) {
-            const int sym = m.args[size_t(argIndex)];
-            if (sym < 0) return false;
-            const MasterSymbol& s = m.symbols[size_t(sym)];
-            if (s.symtype != SymTypeConst || !s.type.is_string() || s.sdefaults.empty())
-                return false;
-            out = s.sdefaults[0];
-            return true;
-        };
-        for (const MasterOp& op : m.ops) {
-            const std::string_view name = op.opname.string();
-            if (name == "getattribute") {
-                const int last = op.firstArg + op.nargs - 1;
-                const bool indexed = m.symbols[size_t(m.args[size_t(last - 1)])].type.is_int();
-                const int args = op.nargs - (indexed ? 1 : 0);
-                ustring obj, attr;
-                bool ok;
-                if (args == 4)
-                    ok = constString(op.firstArg + 1, obj) && constString(op.firstArg + 2, attr);
-                else
-                    ok = constString(op.firstArg + 1, attr);
-                if (!ok) {
-                    n.unknownAttributes = true;
-                    continue;
-                }
-                bool seen = false;
-                for (size_t k = 0; k < n.attributes.size(); ++k)
-                    if (n.attributes[k] == attr && n.scopes[k] == obj) seen = true;
-                if (!seen) n.attributes.push_back(attr), n.scopes.push_back(obj);
-            } else if (name == "texture" || name == "texture3d" || name == "environment" ||
-                       name == "gettextureinfo") {
-                ustring file;
-                if (constString(op.firstArg + 1, file))
-                    addUnique(n.textures, file);
-                else
-                    n.unknownTextures = true;
-            } else if (name == "closure") {
-                ustring cname;
-                if (constString(op.firstArg + 1, cname) || constString(op.firstArg + 2, cname))
-                    addUnique(n.closures, cname);
-            }
-        }
-    }
-    (void)sys;
-    return n;
-}
-
+// Names as an array of the requested length, or (type PTR) as a pointer to the group's own
+// array, which stays valid as long as the group.
 bool putStrings(const std::vector<ustring>& v, TypeDesc type, void* val) {
-    if (type.basetype != TypeDesc::STRING) return false;
-    if (type.arraylen == 0 && type.aggregate == TypeDesc::SCALAR && v.size() != 1) {
-        // A pointer to the names, as the reference hands it out.
-        return false;
+    if (type.basetype == TypeDesc::PTR) {
+        *static_cast<const ustring**>(val) = v.empty() ? nullptr : v.data();
+        return true;
     }
+    if (type.basetype != TypeDesc::STRING) return false;
+    if (type.arraylen == 0 && type.aggregate == TypeDesc::SCALAR && v.size() != 1) return false;
     const size_t n = std::min<size_t>(v.size(), size_t(std::max(1, type.arraylen)));
     for (size_t k = 0; k < n; ++k) static_cast<ustring*>(val)[k] = v[k];
     return true;
@@ -286,7 +230,7 @@ bool ShadingSystem::getattribute(ShaderGroup* group, string_view name, TypeDesc 
         return *(int*)val = int(g.rendererOutputs.size()), true;
     if (name == "renderer_outputs" && type.basetype == TypeDesc::STRING)
         return putStrings(g.rendererOutputs, type, val);
-    const GroupNeeds needs = analyseNeeds(g, *m_impl);
+    const ShaderGroup::Needs& needs = g.needs;
     if (name == "num_globals_needed" && type == TypeInt)
         return *(int*)val = int(needs.globals.size()), true;
     if (name == "globals_needed") return putStrings(needs.globals, type, val);
@@ -304,6 +248,8 @@ bool ShadingSystem::getattribute(ShaderGroup* group, string_view name, TypeDesc 
     if (name == "num_closures_needed" && type == TypeInt)
         return *(int*)val = int(needs.closures.size()), true;
     if (name == "closures_needed") return putStrings(needs.closures, type, val);
+    if (name == "unknown_closures_needed" && type == TypeInt)
+        return *(int*)val = needs.unknownClosures, true;
     return false;
 }
 
@@ -342,11 +288,22 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
     if (groupspec.empty()) return g;
     // The serialised form: "param TYPE NAME VALUES... ;", "shader NAME LAYER ;",
     // "connect A.x B.y ;".
-    std::vector<std::string> stmts = OIIO::Strutil::splits(groupspec, ";");
+    // Statements end at ';'; a failing one is shown with the rest of the text after it.
+    std::vector<std::pair<size_t, std::string>> stmts;
+    for (size_t at = 0; at < groupspec.size();) {
+        size_t end = groupspec.find(';', at);
+        if (end == string_view::npos) end = groupspec.size();
+        size_t first = at;
+        while (first < end && std::isspace(static_cast<unsigned char>(groupspec[first]))) ++first;
+        stmts.emplace_back(first, std::string(groupspec.substr(at, end - at)));
+        at = end + 1;
+    }
     bool ok = true;
-    for (std::string stmt : stmts) {
-        stmt = std::string(OIIO::Strutil::strip(stmt));
+    for (auto& [stmtBegin, rawStmt] : stmts) {
+        const std::string stmt(OIIO::Strutil::strip(rawStmt));
         if (stmt.empty()) continue;
+        const bool okBefore = ok;
+        ok = true;
         std::vector<std::string> tok;
         {
             std::string cur;
@@ -369,12 +326,9 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
             ok &= Shader(*g, "surface", tok[1], tok.size() >= 3 ? tok[2] : tok[1]);
         } else if (tok[0] == "connect" && tok.size() >= 3) {
             const size_t a = tok[1].find('.'), b = tok[2].find('.');
-            if (a == std::string::npos || b == std::string::npos) {
-                ok = false;
-                continue;
-            }
-            ok &= ConnectShaders(*g, tok[1].substr(0, a), tok[1].substr(a + 1), tok[2].substr(0, b),
-                                 tok[2].substr(b + 1));
+            ok = a != std::string::npos && b != std::string::npos &&
+                 ConnectShaders(*g, tok[1].substr(0, a), tok[1].substr(a + 1), tok[2].substr(0, b),
+                                tok[2].substr(b + 1));
         } else if (tok[0] == "param" && tok.size() >= 3) {
             TypeDesc t(tok[1].c_str());
             const std::string pname = tok[2];
@@ -389,12 +343,10 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
                 }
                 values.push_back(tok[k]);
             }
-            if (t.basetype == TypeDesc::UNKNOWN) {
-                ok = false;
-                continue;
-            }
+            ok = t.basetype != TypeDesc::UNKNOWN;
             const size_t count = t.numelements() * t.aggregate;
-            if (t.basetype == TypeDesc::STRING) {
+            if (!ok) {
+            } else if (t.basetype == TypeDesc::STRING) {
                 std::vector<ustring> v(count);
                 for (size_t k = 0; k < count && k < values.size(); ++k) {
                     std::string sv = values[k];
@@ -414,9 +366,16 @@ ShaderGroupRef ShadingSystem::ShaderGroupBegin(string_view groupname, string_vie
                 Parameter(*g, pname, t, v.data(), lockgeom);
             }
         } else {
-            m_impl->error("Unknown statement in serialized shader group: \"" + stmt + "\"");
             ok = false;
         }
+        if (!ok) {
+            m_impl->error("ShaderGroupBegin: error parsing group description: \n        group: " +
+                          g->name.string() + "\n        problem might be here: " +
+                          std::string(groupspec.substr(stmtBegin)));
+            m_impl->current.reset();
+            return nullptr;
+        }
+        ok = okBefore;
     }
     return g;
 }
@@ -585,11 +544,78 @@ const void* ShadingSystem::symbol_address(const ShadingContext& ctx,
 
 const void* ShadingSystem::get_symbol(ShadingContext& ctx, ustring layername, ustring symbolname,
                                       TypeDesc& type) const {
-    (void)ctx;
-    (void)layername;
-    (void)symbolname;
     type = TypeDesc();
-    return nullptr;
+    if (!ctx.prog || !ctx.prog->group) return nullptr;
+    const ShaderGroup& g = *ctx.prog->group;
+    const ShaderSymbol* sym =
+        layername.empty() ? find_symbol(g, symbolname) : find_symbol(g, layername, symbolname);
+    const void* addr = symbol_address(ctx, sym);
+    if (addr) type = sym->type;
+    return addr;
+}
+
+bool ShadingSystem::execute_init(ShadingContext& ctx, ShaderGroup& group, int, ShaderGlobals& sg,
+                                 void*, void*, bool run) {
+    return m_impl->executeInit(ctx, group, sg, run);
+}
+
+bool ShadingSystem::execute_layer(ShadingContext& ctx, int, ShaderGlobals& sg, void*, void*,
+                                  int layernumber) {
+    if (ctx.sg != &sg) ctx.sg = &sg;
+    return m_impl->executeLayer(ctx, layernumber);
+}
+
+bool ShadingSystem::execute_cleanup(ShadingContext& ctx) {
+    return m_impl->executeCleanup(ctx);
+}
+
+int ShadingSystem::find_layer(const ShaderGroup& group, ustring layername) const {
+    return group.findLayer(layername);
+}
+
+bool ShadingSystem::ReParameter(ShaderGroup& group, string_view layername, string_view paramname,
+                                TypeDesc type, const void* val) {
+    ShadingSystemImpl& s = *m_impl;
+    const int l = group.findLayer(ustring(layername));
+    if (l < 0) {
+        s.error("ReParameter: no layer \"" + std::string(layername) + "\" in group \"" +
+                group.name.string() + "\"");
+        return false;
+    }
+    ShaderInstance& inst = group.layers[size_t(l)];
+    const int sym = inst.master->findSymbol(ustring(paramname));
+    if (sym < 0 || !inst.master->symbols[size_t(sym)].isParam()) {
+        s.error("ReParameter: layer \"" + std::string(layername) + "\" has no parameter \"" +
+                std::string(paramname) + "\"");
+        return false;
+    }
+    const MasterSymbol& ms = inst.master->symbols[size_t(sym)];
+    const InstanceValue* old = inst.valueFor(sym);
+    const bool geometric = old ? !old->lockgeom : !ms.lockgeom;
+    const TypeDesc st = ms.type.simpletype();
+    if (!geometric || type.basetype != st.basetype || type.aggregate != st.aggregate ||
+        (st.arraylen > 0 && type.arraylen != st.arraylen)) {
+        // Constant parameters may have been folded into the code; values of another type
+        // would have to be converted: both are refused, leaving the group as it was.
+        return false;
+    }
+    InstanceValue iv;
+    iv.symbol = sym;
+    iv.type = type;
+    iv.lockgeom = false;
+    iv.data.assign(static_cast<const char*>(val), static_cast<const char*>(val) + type.size());
+    bool replaced = false;
+    for (InstanceValue& v : inst.values)
+        if (v.symbol == sym) v = iv, replaced = true;
+    if (!replaced) inst.values.push_back(iv);
+    if (group.program) {
+        Program& prog = *group.program;
+        const ProgramLayer& pl = prog.layers[size_t(l)];
+        const ShaderSymbol& ps = prog.symbols[size_t(pl.firstSymbol + sym)];
+        if (ps.hasStorage)
+            writeValue(prog.initImage.data() + ps.offset, ps.type, ms, inst.valueFor(sym));
+    }
+    return true;
 }
 
 int ShadingSystem::raytype_bit(ustring name) {

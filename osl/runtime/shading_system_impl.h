@@ -43,6 +43,7 @@ public:
     // Attributes (written by attribute() on the main thread, read while building groups).
     int debug = 0, compileReport = 0, optimize = 2, lockgeom = 1, debugNan = 0, debugUninit = 0;
     int errorRepeats = 0, lazyLayers = 1, countLayerExecs = 0, greedyJit = 0;
+    int lazyGlobals = 1, debugLayers = 0;
     std::string searchpathShader;
     std::string commonspace = "common";
     std::string colorspace = "Rec709";
@@ -58,6 +59,10 @@ public:
     void message(const std::string& msg) const;
 
     bool execute(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& sg, bool run);
+    // execute() in three steps, for renderers that run chosen layers themselves.
+    bool executeInit(ShadingContext& ctx, ShaderGroup& group, ShaderGlobals& sg, bool run);
+    bool executeLayer(ShadingContext& ctx, int layer);
+    bool executeCleanup(ShadingContext& ctx);
 };
 
 } // namespace OSL

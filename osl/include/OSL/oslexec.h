@@ -104,6 +104,22 @@ public:
     }
     bool execute(ShadingContext* ctx, ShaderGroup& group, ShaderGlobals& globals, bool run = true);
 
+    // execute() in steps: prepare the context for the group (running nothing unless asked),
+    // run chosen layers (each at most once, pulling its upstream layers), then finish (Ci,
+    // buffered shader output).
+    bool execute_init(ShadingContext& ctx, ShaderGroup& group, int shadeindex,
+                      ShaderGlobals& globals, void* userdata_base_ptr, void* output_base_ptr,
+                      bool run = true);
+    bool execute_layer(ShadingContext& ctx, int shadeindex, ShaderGlobals& globals,
+                       void* userdata_base_ptr, void* output_base_ptr, int layernumber);
+    bool execute_cleanup(ShadingContext& ctx);
+    // Index of the named layer in the group, or -1.
+    int find_layer(const ShaderGroup& group, ustring layername) const;
+    // Changes a parameter of a built group's layer between executions; only parameters that
+    // were not folded as constants (lockgeom=0 or interactive) can change.
+    bool ReParameter(ShaderGroup& group, string_view layername, string_view paramname,
+                     TypeDesc type, const void* val);
+
     const ShaderSymbol* find_symbol(const ShaderGroup& group, ustring layername,
                                     ustring symbolname) const;
     // Searches the layers from the last to the first; "layer.sym" names a layer explicitly.
