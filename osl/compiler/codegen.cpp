@@ -96,7 +96,9 @@ Symbol* CodeGen::newStructSymbol(const std::string& name, const TypeSpec& t, Sym
 }
 
 Symbol* CodeGen::temp(const TypeSpec& t) {
-    return newStructSymbol("$tmp" + std::to_string(++m_tmpCount), t, SymTypeTemp);
+    Symbol* s = newStructSymbol("$tmp" + std::to_string(++m_tmpCount), t, SymTypeTemp);
+    s->bornAt = nextOp();
+    return s;
 }
 
 Symbol* CodeGen::constant(const TypeSpec& t, const std::vector<int>& iv,
@@ -464,10 +466,17 @@ std::string CodeGen::metaHint(const Node* m) {
 void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
     TypeSpec t = resolveType(p->typeName, p);
     SymType st = p->typeName.isOutput ? SymTypeOutputParam : SymTypeParam;
+    const Node* init = p->kid(0);
+    bool unsized = t.is_unsized_array();
+    if (unsized && init && init->kind == NodeKind::InitList && !init->kids.empty() &&
+        !t.is_structure_based()) {
+        // The default's length sizes the array inside the shader; the OSO still says T[].
+        t.make_array(int(init->kids.size()));
+    }
     Symbol* s = newStructSymbol(p->name, t, st);
+    s->unsizedParam = unsized;
     for (const auto& m : p->metadata) s->metaHints.push_back(metaHint(m.get()));
     declare(p->name, s, p);
-    const Node* init = p->kid(0);
     auto fillZero = [&](Symbol* sym) {
         int n = sym->type.numelements();
         if (sym->type.is_unsized_array()) n = 0;
@@ -512,6 +521,54 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
         }
         if (allConst) return;
         for (Symbol* f : s->fields) f->ivals.clear(), f->fvals.clear(), f->svals.clear();
+        bool plainFields = true;
+        for (Symbol* f : s->fields)
+            plainFields = plainFields && f->fields.empty() && !f->type.is_closure_based();
+        if (plainFields) {
+            // Constant fields keep their defaults; each other field is computed by a code
+            // section of its own and starts from whatever components are constant.
+            std::vector<Symbol*> computed;
+            for (size_t i = 0; i < s->fields.size(); ++i) {
+                Symbol* f = s->fields[i];
+                if (i >= init->kids.size()) {
+                    fillZero(f);
+                    continue;
+                }
+                if (constValue(init->kid(i), f->type, f->ivals, f->fvals, f->svals)) continue;
+                f->ivals.clear(), f->fvals.clear(), f->svals.clear();
+                fillZero(f);
+                const Node* k = init->kid(i);
+                bool components =
+                    (k->kind == NodeKind::TypeCtor && !k->isCast) || k->kind == NodeKind::InitList;
+                if (f->type.is_triple() && components && k->kids.size() == 3) {
+                    for (int c = 0; c < 3; ++c) {
+                        std::vector<int> civ;
+                        std::vector<float> cfv;
+                        std::vector<std::string> csv;
+                        if (constValue(k->kid(c), TypeSpec(TypeDesc::TypeFloat), civ, cfv, csv))
+                            f->fvals[c] = cfv[0];
+                    }
+                }
+                f->initexpr = true;
+                computed.push_back(f);
+            }
+            m_curFile = p->file;
+            m_curLine = p->line;
+            for (Symbol* f : computed) {
+                f->initBegin = nextOp();
+                const Node* k = init->kid(size_t(f->fieldIndex));
+                TypeSpec ft = f->type;
+                Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
+                if (!assignCompatible(ft, val->type)) {
+                    error(k, "Can't assign '" + val->type.string() + "' to '" + ft.string() + " " +
+                                 f->name + "'");
+                    continue;
+                }
+                assignInto(f, val, k);
+                f->initEnd = nextOp();
+            }
+            return;
+        }
     }
     if (!t.is_structure_based() && !t.is_closure_based()) {
         std::vector<int> iv;

@@ -113,6 +113,7 @@ private:
     void store(const LRef& r, Symbol* value, const Node* at);
     Symbol* convert(Symbol* v, const TypeSpec& to, const Node* at);
     void assignInto(Symbol* dst, Symbol* src, const Node* at);
+    bool retarget(Symbol* dst, Symbol* src);
     void checkWritable(Symbol* s, const Node* at, const std::string& context = "",
                        bool plainAssign = false);
     Symbol* voidValue();

@@ -143,7 +143,29 @@ void CodeGen::assignInto(Symbol* dst, Symbol* src, const Node* at) {
         emit("arraycopy", {dst, src});
         return;
     }
+    if (retarget(dst, src)) return;
     emit("assign", {dst, src});
+}
+
+// A value computed into a fresh temporary by the op just emitted is written straight into its
+// destination instead, as oslc generates an expression into the variable it is assigned to.
+bool CodeGen::retarget(Symbol* dst, Symbol* src) {
+    if (src->symtype != SymTypeTemp || !src->fields.empty() || src->bornAt < 0 ||
+        dst->type.is_array() || !(dst->type == src->type) || m_ops->empty())
+        return false;
+    int last = int(m_ops->size()) - 1;
+    Op& op = (*m_ops)[last];
+    if (op.args.empty() || op.args[0] != src || op.rw.empty() || op.rw[0] != 'w' ||
+        !op.jumps.empty())
+        return false;
+    for (size_t a = 1; a < op.args.size(); ++a)
+        if (op.args[a] == src || (op.args[a] == dst && op.rw[a] != 'r')) return false;
+    for (int i = last - 1; i >= src->bornAt && i >= 0; --i)
+        for (Symbol* a : (*m_ops)[i].args)
+            if (a == src) return false;
+    op.args[0] = dst;
+    src->renamedTo = dst;
+    return true;
 }
 
 void CodeGen::checkWritable(Symbol* s, const Node* at, const std::string& context,
@@ -538,7 +560,7 @@ Symbol* CodeGen::assign(const Node* e) {
         }
         checkWritable(r.sym, e, "", true);
         store(r, v, e);
-        return v;
+        return v->renamedTo ? v->renamedTo : v;
     }
     Symbol* cur = load(r, e);
     Symbol* v = expr(rhs);

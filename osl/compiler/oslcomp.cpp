@@ -10,6 +10,7 @@
 #include "preprocessor.h"
 #include "shader_headers.h"
 
+#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
@@ -31,6 +32,20 @@ private:
     ErrorHandler* m_handler;
 };
 
+// What -M, -MM, -MD, -MMD, -MF and -MT ask for: a make rule naming the files the shader reads.
+struct DependencyRequest {
+    bool wanted = false;
+    bool system = false;   // list the standard headers too (-M, -MD)
+    bool toStdout = false; // -M, -MM without -MF
+    std::string file, target;
+};
+
+static bool isBuiltinHeader(const std::string& name) {
+    for (const auto& h : builtinShaderHeaders())
+        if (h.first == name) return true;
+    return false;
+}
+
 static bool readFile(const std::string& path, std::string& text) {
     std::ifstream in(path, std::ios::binary);
     if (!in) return false;
@@ -48,6 +63,7 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
     for (const auto& h : builtinShaderHeaders()) pp.addBuiltinHeader(h.first, h.second);
     std::string output, echoed;
     bool preprocessOnly = false;
+    DependencyRequest deps;
     for (size_t i = 0; i < options.size(); ++i) {
         const std::string& o = options[i];
         auto value = [&](size_t prefix) -> std::string {
@@ -70,8 +86,15 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
             diag.warningsAreErrors = true;
         } else if (o == "-q") {
             diag.quiet = true;
-        } else if (o == "-MF" || o == "-MT" || o == "-MQ") {
-            ++i;
+        } else if (o == "-M" || o == "-MM" || o == "-MD" || o == "-MMD") {
+            deps.wanted = true;
+            deps.system = o == "-M" || o == "-MD";
+            deps.toStdout = o == "-M" || o == "-MM";
+        } else if (o.rfind("-MF", 0) == 0) {
+            deps.file = value(3);
+            continue;
+        } else if (o.rfind("-MT", 0) == 0 || o.rfind("-MQ", 0) == 0) {
+            deps.target = value(3);
             continue;
         }
         echoed += (echoed.empty() ? "" : " ") + o;
@@ -92,7 +115,34 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
     }
     std::string pre, userPre;
     if (!pp.run(stdosl, stdoslName, pre)) return false;
+    size_t firstUserInclude = pp.includedFiles().size();
     if (!pp.run(source, display, userPre)) return false;
+    std::string defaultOutput =
+        output.empty() ? std::filesystem::path(filename).stem().string() + ".oso" : output;
+    if (deps.wanted) {
+        std::vector<std::string> files;
+        if (deps.system) files.push_back(stdoslpath.empty() ? stdoslName : stdoslpath);
+        const auto& inc = pp.includedFiles();
+        for (size_t k = firstUserInclude; k < inc.size(); ++k)
+            if (deps.system || !isBuiltinHeader(inc[k])) files.push_back(inc[k]);
+        std::string text = (deps.target.empty() ? defaultOutput : deps.target) + ": " + display;
+        for (const auto& f : files) text += " \\\n  " + f;
+        text += "\n";
+        std::string depFile = deps.file;
+        if (depFile.empty() && !deps.toStdout)
+            depFile = std::filesystem::path(defaultOutput).replace_extension(".d").string();
+        if (depFile.empty() || depFile == "-") {
+            std::fputs(text.c_str(), stdout);
+            std::fflush(stdout);
+        } else {
+            std::ofstream df(depFile, std::ios::binary);
+            df << text;
+            if (!df) {
+                diag.error(display, 0, "could not write " + depFile);
+                return false;
+            }
+        }
+    }
     if (preprocessOnly) {
         oso = userPre;
         if (toFile) {
@@ -112,7 +162,7 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
     if (!gen.run(decls, unit)) return false;
     oso = writeOSO(unit, echoed);
     if (toFile) {
-        if (output.empty()) output = std::filesystem::path(filename).stem().string() + ".oso";
+        output = defaultOutput;
         std::ofstream out(output, std::ios::binary);
         out << oso;
         if (!out) {

@@ -4,6 +4,7 @@
 #include "codegen.h"
 
 #include <algorithm>
+#include <set>
 #include <sstream>
 
 namespace OSL::pvt {
@@ -131,7 +132,9 @@ std::string writeOSO(ShaderUnit& u, const std::string& options) {
         if (!symbolUsed(s)) continue;
         bool withValues =
             s->symtype == SymTypeParam || s->symtype == SymTypeOutputParam || s->isConst();
-        o << symtypeName(s->symtype) << "\t" << s->type.string() << "\t" << s->name << "\t";
+        std::string type = s->type.string();
+        if (s->unsizedParam && s->type.is_array()) type = s->type.elementtype().string() + "[]";
+        o << symtypeName(s->symtype) << "\t" << type << "\t" << s->name << "\t";
         if (withValues) o << values(s) << "\t\t";
         for (const auto& m : s->metaHints) o << m << " ";
         if (!s->metaHints.empty()) o << " ";
@@ -158,8 +161,11 @@ std::string writeOSO(ShaderUnit& u, const std::string& options) {
     }
     // Code sections: one per parameter with a computed default, then the main body.
     std::vector<std::pair<int, std::string>> sections;
+    // A struct computed as a whole names its section after itself; fields computed one by one
+    // name their own.
+    std::set<int> starts;
     for (const Symbol* s : u.symbols)
-        if (!s->structParent && s->initBegin >= 0 && s->initEnd > s->initBegin)
+        if (s->initBegin >= 0 && s->initEnd > s->initBegin && starts.insert(s->initBegin).second)
             sections.push_back({s->initBegin, s->name});
     std::sort(sections.begin(), sections.end());
     sections.push_back({u.mainBegin, "___main___"});

@@ -27,6 +27,9 @@ struct Symbol {
     std::vector<Symbol*> fields; // struct variables list their field symbols
     int readFirst = INT_MAX, readLast = -1, writeFirst = INT_MAX, writeLast = -1;
     bool derivs = false;
+    int bornAt = -1;             // for temporaries: the op count when created
+    Symbol* renamedTo = nullptr; // a temporary whose op now writes this variable instead
+    bool unsizedParam = false;   // a `T name[]` parameter: sized by its default, written as T[]
 
     bool isConst() const { return symtype == SymTypeConst; }
     void markRead(int op) {

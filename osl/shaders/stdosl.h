@@ -227,8 +227,13 @@ OSL_QUERY_T(int) OSL_QUERY_T(float) OSL_QUERY_T(string) OSL_QUERY_T(color) OSL_Q
 OSL_QUERY_T(vector) OSL_QUERY_T(normal) OSL_QUERY_T(matrix)
 int isconnected(closure color x);
 void setmessage(string name, closure color value);
+void setmessage(string name, closure color value[]);
 int getmessage(string name, output closure color value);
 int getmessage(string source, string name, output closure color value);
+int getmessage(string name, output closure color value[]);
+int getmessage(string source, string name, output closure color value[]);
+int arraylength(closure color a[]);
+int isconstant(closure color x);
 int dict_find(string dictionary, string query);
 int dict_find(int node, string query);
 int dict_next(int node);

@@ -1,0 +1,79 @@
+// The make rules -MD / -MMD / -MF / -MT write: the shader's own file and every header it read.
+#include <OSL/oslcomp.h>
+
+#include <gtest/gtest.h>
+
+#include <unistd.h>
+
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <string>
+
+namespace {
+
+namespace fs = std::filesystem;
+
+class DependencyOutput : public ::testing::Test {
+protected:
+    void SetUp() override {
+        dir = fs::temp_directory_path() /
+              ("tessel-deps-test-" + std::to_string(::getpid()) + "-" +
+               ::testing::UnitTest::GetInstance()->current_test_info()->name());
+        fs::create_directories(dir);
+        write("myheader.h", "int foo (int x) { return x * 2; }\n");
+        write("test.osl", "#include \"myheader.h\"\n#include \"color2.h\"\n"
+                          "shader test () { int bar = foo (42); printf (\"%d\\n\", bar); }\n");
+        saved = fs::current_path();
+        fs::current_path(dir);
+    }
+    void TearDown() override {
+        fs::current_path(saved);
+        std::error_code ec;
+        fs::remove_all(dir, ec);
+    }
+    void write(const std::string& name, const std::string& text) {
+        std::ofstream(dir / name) << text;
+    }
+    static std::string read(const std::string& name) {
+        std::ifstream in(name);
+        std::stringstream ss;
+        ss << in.rdbuf();
+        return ss.str();
+    }
+    bool compile(const std::vector<std::string>& options) {
+        OSL::OSLCompiler c;
+        return c.compile("test.osl", options);
+    }
+    fs::path dir, saved;
+};
+
+TEST_F(DependencyOutput, MMDWritesUserHeadersBesideTheOutput) {
+    ASSERT_TRUE(compile({"-q", "-MMD"}));
+    EXPECT_EQ(read("test.d"), "test.oso: test.osl \\\n  myheader.h\n");
+    EXPECT_TRUE(fs::exists("test.oso"));
+}
+
+TEST_F(DependencyOutput, MFAndMTChooseFileAndTarget) {
+    ASSERT_TRUE(compile({"-q", "-MMD", "-MF", "mycustom.d", "-MT", "customtarget"}));
+    EXPECT_EQ(read("mycustom.d"), "customtarget: test.osl \\\n  myheader.h\n");
+    ASSERT_TRUE(compile({"-q", "-MMD", "-MFmydep.d"}));
+    EXPECT_EQ(read("mydep.d"), "test.oso: test.osl \\\n  myheader.h\n");
+}
+
+TEST_F(DependencyOutput, MDListsTheStandardHeadersToo) {
+    fs::create_directories("out");
+    ASSERT_TRUE(compile({"-q", "-MD", "-o", "out/x.oso"}));
+    std::string d = read("out/x.d");
+    EXPECT_EQ(d.rfind("out/x.oso: test.osl \\\n", 0), 0u) << d;
+    EXPECT_NE(d.find("stdosl.h"), std::string::npos) << d;
+    EXPECT_NE(d.find("  myheader.h"), std::string::npos) << d;
+    EXPECT_NE(d.find("  color2.h"), std::string::npos) << d;
+}
+
+TEST_F(DependencyOutput, NoRuleWithoutTheOption) {
+    ASSERT_TRUE(compile({"-q"}));
+    EXPECT_FALSE(fs::exists("test.d"));
+}
+
+} // namespace

@@ -1,0 +1,65 @@
+// Standard-library calls whose overloads reach beyond plain values: messages and queries of
+// closure arrays, which the reference compiler accepts.
+#include <OSL/oslcomp.h>
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+struct Errors : OSL::ErrorHandler {
+    std::vector<std::string> errors;
+    void operator()(int code, const std::string& msg) override {
+        if (code == EH_ERROR || code == EH_SEVERE) errors.push_back(msg);
+    }
+};
+
+std::string compileOrFail(const std::string& src, Errors& eh) {
+    OSL::OSLCompiler c(&eh);
+    std::string oso;
+    if (!c.compile_buffer(src, oso, {}, "", "test.osl")) return "";
+    return oso;
+}
+
+TEST(LibraryOverloads, ClosureArraysTravelThroughMessages) {
+    Errors eh;
+    std::string oso = compileOrFail("shader t () {\n"
+                                    "    closure color C[2] = { diffuse(N), emission() };\n"
+                                    "    setmessage (\"C\", C);\n"
+                                    "    closure color got[2];\n"
+                                    "    int ok = getmessage (\"C\", got);\n"
+                                    "    ok += getmessage (\"trace\", \"C\", got);\n"
+                                    "    Ci = got[0] + got[1] * ok;\n"
+                                    "}\n",
+                                    eh);
+    ASSERT_FALSE(oso.empty()) << (eh.errors.empty() ? "" : eh.errors[0]);
+    EXPECT_NE(oso.find("\tsetmessage\t$const"), std::string::npos);
+    EXPECT_NE(oso.find("\tgetmessage\t$tmp"), std::string::npos);
+    EXPECT_NE(oso.find("%argrw{\"wrw\"}"), std::string::npos) << "the message lands in `got`";
+}
+
+TEST(LibraryOverloads, ClosureArrayLengthIsKnown) {
+    Errors eh;
+    std::string oso = compileOrFail("shader t (output float n = 0) {\n"
+                                    "    closure color C[3];\n"
+                                    "    n = arraylength (C);\n"
+                                    "}\n",
+                                    eh);
+    ASSERT_FALSE(oso.empty()) << (eh.errors.empty() ? "" : eh.errors[0]);
+    EXPECT_NE(oso.find("\tarraylength\t"), std::string::npos);
+}
+
+TEST(LibraryOverloads, MessagesStillRefuseWrongArguments) {
+    Errors eh;
+    EXPECT_TRUE(
+        compileOrFail("shader t () { closure color C[2]; setmessage (1, C); }\n", eh).empty());
+    EXPECT_FALSE(eh.errors.empty());
+    Errors eh2;
+    EXPECT_TRUE(compileOrFail("shader t () { closure color C[2]; int x = getmessage (C); }\n", eh2)
+                    .empty());
+    EXPECT_FALSE(eh2.errors.empty());
+}
+
+} // namespace
