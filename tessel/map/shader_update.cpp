@@ -53,7 +53,8 @@ void AssignTimeValueControllers(IParamBlock2* block, SourceKey key) {
             ctrl ? dynamic_cast<IExprCtrl*>(ctrl->GetInterface(IID_EXPR_CONTROL)) : nullptr;
         if (!expr) {
             if (ctrl) ctrl->DeleteMe();
-            ReportError("No expression controller for the timeValue input " + ToUTF8(def.int_name));
+            std::string message = "No expression controller for the timeValue input ";
+            ReportError(message.append(ToUTF8(def.int_name)));
             continue;
         }
         const bool reportErrors = expr->GetReportErrors();
@@ -133,18 +134,22 @@ bool UpdateShader(OSLTex& map, bool loading) {
     }
     map.shaderName_ = FromUTF8(registry.RecordedShaderName(key));
 
+    bool redescribed = false;
     if (loading && map.shaderBlock_) {
         std::shared_ptr<ParamBlockDesc2> savedDesc = desc;
         if (map.savedFormat_ < kShaderFormatCurrent) {
             savedDesc = registry.DescriptorForVersion(key, map.savedFormat_);
         } else if (map.savedFormat_ > kShaderFormatCurrent) {
-            ReportError("Save format for shader " + ToUTF8(map.shaderName_) +
-                        " is newer than this trelm version!! Potential loss of data!!\n");
+            std::string message = "Save format for shader ";
+            message.append(ToUTF8(map.shaderName_))
+                .append(" is newer than this trelm version!! Potential loss of data!!\n");
+            ReportError(message);
         }
-        if (savedDesc) map.shaderBlock_->Redescribe(savedDesc.get());
+        if (savedDesc) redescribed = map.shaderBlock_->Redescribe(savedDesc.get());
     }
 
-    if (map.currentDesc_ == desc) {
+    // A block just read or cloned is rebuilt in the current layout even under the same descriptor.
+    if (map.currentDesc_ == desc && !redescribed) {
         delete record;
         return true;
     }

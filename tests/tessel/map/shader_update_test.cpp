@@ -260,3 +260,28 @@ TEST_F(ShaderUpdateTest, ACodeChangeIsOneNamedUndoStep) {
     theHold.Accept(L"Typed");
     EXPECT_EQ(theHold.NumUndoSteps(), 1);
 }
+
+TEST_F(ShaderUpdateTest, ALoadedBlockIsReadInItsSavedFormatAndRebuiltInTheCurrentOne) {
+    MapHolder map;
+    map.SetCode(Shader("loaded", "float Gain = 0.5, float Steps[] = {1, 2}"));
+    IParamBlock2* pb = map->ShaderBlock();
+    pb->SetValue(IDOf(pb, L"Gain"), 0, 0.3f);
+    pb->SetValue(IDOf(pb, L"Steps"), 0, 9.0f, 0);
+
+    // Format 20190 had no array inputs: the saved block cannot have held Steps.
+    map->SetSavedFormat(20190);
+    ASSERT_TRUE(UpdateShader(*map, true));
+    pb = map->ShaderBlock();
+    EXPECT_EQ(pb->GetDesc(), map->CurrentDesc().get());
+    EXPECT_FLOAT_EQ(pb->GetFloat(IDOf(pb, L"Gain")), 0.3f);
+    ASSERT_EQ(pb->Count(IDOf(pb, L"Steps")), 2);
+    EXPECT_FLOAT_EQ(pb->GetFloat(IDOf(pb, L"Steps"), 0, 0), 1.0f);
+
+    MessageProbe probe;
+    map->SetSavedFormat(20300);
+    ASSERT_TRUE(UpdateShader(*map, true));
+    EXPECT_TRUE(probe.Saw("Save format for shader upd_loaded is newer than this trelm version!! "
+                          "Potential loss of data!!\n"));
+    pb = map->ShaderBlock();
+    EXPECT_FLOAT_EQ(pb->GetFloat(IDOf(pb, L"Gain")), 0.3f);
+}
