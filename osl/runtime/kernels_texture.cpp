@@ -39,8 +39,11 @@ void storeLookup(const ExecState& st, const Operand& R, const TextureOptionOutpu
         st.store(*out.alpha, 0, Dual2<float>(res[n], dx ? dx[n] : 0.0f, dy ? dy[n] : 0.0f));
 }
 
+// A lookup that works clears the message to the same empty string that "" is in a shader.
+const ustring kEmpty("");
+
 void finishError(const ExecState& st, const TextureOptionOutputs& out, bool ok, ustring err) {
-    if (out.errormessage) *st.s(*out.errormessage) = ok ? ustring() : err;
+    if (out.errormessage) *st.s(*out.errormessage) = ok ? kEmpty : err;
 }
 
 void kTexture(ExecState& st, const Instr& in) {
