@@ -516,8 +516,12 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
                 fillZero(f);
                 continue;
             }
+            const Node* k = init->kid(i);
+            if (f->type.is_closure() && k->kind == NodeKind::IntLit && k->intValue == 0)
+                continue; // an empty closure: no value to write
+            // Array fields are computed by code even from constants, as oslc does.
             allConst = !f->type.is_structure_based() && !f->type.is_closure_based() &&
-                       constValue(init->kid(i), f->type, f->ivals, f->fvals, f->svals);
+                       !f->type.is_array() && constValue(k, f->type, f->ivals, f->fvals, f->svals);
         }
         if (allConst) return;
         for (Symbol* f : s->fields) f->ivals.clear(), f->fvals.clear(), f->svals.clear();
@@ -534,7 +538,9 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
                     fillZero(f);
                     continue;
                 }
-                if (constValue(init->kid(i), f->type, f->ivals, f->fvals, f->svals)) continue;
+                if (!f->type.is_array() &&
+                    constValue(init->kid(i), f->type, f->ivals, f->fvals, f->svals))
+                    continue;
                 f->ivals.clear(), f->fvals.clear(), f->svals.clear();
                 fillZero(f);
                 const Node* k = init->kid(i);
