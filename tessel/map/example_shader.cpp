@@ -3,7 +3,7 @@
 
 const char* const kExampleShader =
     "// A simple example shader with three inputs and two outputs, to demonstrate the syntax.\n"
-    "// The OSL language specification describes everything a shader can do.\n"
+    "// The OSL language reference describes everything a shader can do.\n"
     "// The editor's \"More...\" button leads to further shaders and help.\n"
     "//\n"
     "\n"

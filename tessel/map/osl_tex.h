@@ -74,7 +74,7 @@ public:
     TrelmSDK::FileWatchHandle WatchHandle() const { return watchHandle_; }
 
     // The linked-file watcher: remembers the current key, then watches the linked path while
-    // "OSLAutoUpdate" is on (Part of the map's reply to path and auto-update changes).
+    // "OSLAutoUpdate" is on; the map re-arms it when its path or auto-update changes.
     void ArmLinkedFileWatcher();
     // The watcher's delivery: reloads the linked file when it passes the auto-update rules.
     void ReloadLinkedFile(const MSTR& path);
