@@ -3,6 +3,7 @@
 #include "command_registry.h"
 
 #include <viewport/hlsl_generator.h>
+#include <viewport/precompute_function.h>
 
 #ifdef TESSEL_HAVE_OSL_COMPILER
 #include <OSL/oslcomp.h>
@@ -62,6 +63,19 @@ std::string FunctionName(const std::filesystem::path& path) {
     return name;
 }
 
+// The inputs that the CPU computes for the function, as they come out for the shader's default
+// parameter values: the file of each sampler, the code of each string-op result.
+void PrintPrecomputedInputs(const std::string& name) {
+    const oslo::PrecomputeResults results = oslo::RunPrecomputeFunction(name, {});
+    if (results.empty()) return;
+    std::cerr << "Computed on the CPU for the default parameter values:\n";
+    for (const auto& [input, value] : results) {
+        std::cerr << "  " << input << " = " << value.value;
+        if (!value.str.empty()) std::cerr << " \"" << oslo::NarrowText(value.str) << "\"";
+        std::cerr << "\n";
+    }
+}
+
 int RunHLSL(const std::string& file, const std::string& nameOption) {
     const std::filesystem::path path(file);
     std::string oso;
@@ -79,6 +93,7 @@ int RunHLSL(const std::string& file, const std::string& nameOption) {
     }
     std::cerr << "Accuracy: " << info.accuracy << "% (" << info.unsupportedCount
               << " unsupported of " << info.opCount << " instructions)\n";
+    PrintPrecomputedInputs(name);
     return 0;
 }
 
