@@ -4,10 +4,6 @@
 
 #include <OSL/oslcomp.h>
 
-#include <unistd.h>
-
-#include <filesystem>
-#include <fstream>
 #include <iostream>
 #include <memory>
 
@@ -37,7 +33,7 @@ int runCompile(const std::vector<std::string>& args) {
                          "  -D SYM[=VAL] define a macro;  -U SYM  undefine it\n"
                          "  -E           only preprocess, to the output\n"
                          "  -O0 -O1 -O2  optimisation level\n"
-                         "  -M -MM       write a make rule of the files read to stdout\n"
+                         "  -M -MM       only write a make rule of the files read, to stdout\n"
                          "  -MD -MMD     write it to NAME.d (-MM, -MMD: without standard headers)\n"
                          "  -MF FILE     the file for the rule;  -MT TARGET  the rule's target\n"
                          "  -Wall -Werror  warnings; warnings as errors\n"
@@ -58,44 +54,20 @@ int runCompile(const std::vector<std::string>& args) {
         std::cerr << "tessel compile: no input file\n";
         return 1;
     }
-    // oslc prints the make rule of -M / -MM after its "Compiled" line: the compiler writes it to
-    // a scratch file that is copied to stdout once the line is out.
-    bool depsToStdout = false, depsFileGiven = false;
-    for (auto& o : options) {
-        if (o.rfind("-MF", 0) == 0) depsFileGiven = true;
-        if (o == "-M" || o == "-MM") depsToStdout = true;
-    }
-    depsToStdout = depsToStdout && !depsFileGiven;
-    std::string depsScratch;
-    if (depsToStdout) {
-        depsScratch = (std::filesystem::temp_directory_path() /
-                       ("tessel-deps-" + std::to_string(::getpid()) + ".d"))
-                          .string();
-        for (auto& o : options)
-            if (o == "-M" || o == "-MM") o += "D";
-        options.push_back("-MF");
-        options.push_back(depsScratch);
-    }
+    // -M and -MM only print the make rule, as oslc does: no compile line follows it.
+    bool depsOnly = false;
+    for (const auto& o : options) depsOnly = depsOnly || o == "-M" || o == "-MM";
     PlainErrorHandler handler;
     int status = 0;
     for (const auto& f : files) {
         OSL::OSLCompiler compiler(&handler);
         if (compiler.compile(f, options)) {
-            if (!quiet)
+            if (!quiet && !depsOnly)
                 std::cout << "Compiled " << f << " -> " << compiler.output_filename() << "\n";
-            if (depsToStdout) {
-                std::ifstream deps(depsScratch, std::ios::binary);
-                std::cout << deps.rdbuf();
-                std::cout.flush();
-            }
         } else {
             std::cout << "FAILED " << f << "\n";
             status = 1;
         }
-    }
-    if (depsToStdout) {
-        std::error_code ec;
-        std::filesystem::remove(depsScratch, ec);
     }
     return status;
 }

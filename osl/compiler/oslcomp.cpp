@@ -134,6 +134,7 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
         if (depFile.empty() || depFile == "-") {
             std::fputs(text.c_str(), stdout);
             std::fflush(stdout);
+            if (deps.toStdout) return true; // -M, -MM: the rule is all that is asked for
         } else {
             std::ofstream df(depFile, std::ios::binary);
             df << text;

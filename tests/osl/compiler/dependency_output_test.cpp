@@ -71,6 +71,15 @@ TEST_F(DependencyOutput, MDListsTheStandardHeadersToo) {
     EXPECT_NE(d.find("  color2.h"), std::string::npos) << d;
 }
 
+TEST_F(DependencyOutput, MMPrintsTheRuleInsteadOfCompiling) {
+    ::testing::internal::CaptureStdout();
+    bool ok = compile({"-MM"});
+    std::string printed = ::testing::internal::GetCapturedStdout();
+    ASSERT_TRUE(ok);
+    EXPECT_EQ(printed, "test.oso: test.osl \\\n  myheader.h\n");
+    EXPECT_FALSE(fs::exists("test.oso"));
+}
+
 TEST_F(DependencyOutput, NoRuleWithoutTheOption) {
     ASSERT_TRUE(compile({"-q"}));
     EXPECT_FALSE(fs::exists("test.d"));
