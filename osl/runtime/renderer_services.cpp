@@ -176,6 +176,9 @@ bool RendererServices::get_texture_info(ustring filename, TextureHandle* handle,
                                         ustring* errormessage) {
     TextureSystem* ts = texturesys();
     if (ts) {
+        // Resolving a tile needs this thread's cache state; the texture system does not fetch
+        // it itself there.
+        if (!thread) thread = ts->get_perthread_info();
         if (!handle) handle = ts->get_texture_handle(filename, thread);
         if (handle && ts->is_udim(handle)) {
             if (TextureHandle* tile = ts->resolve_udim(handle, thread, s, t)) handle = tile;
