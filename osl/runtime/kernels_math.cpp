@@ -36,9 +36,14 @@ struct Mul {
     static D2 d(const D2& a, const D2& b) { return a * b; }
     static int i(int a, int b) { return a * b; }
 };
+// Divisors too small to be normal floats count as zero, as under the flush-to-zero arithmetic
+// the reference's compiled shaders run with.
+inline bool zeroDivisor(float b) {
+    return std::fabs(b) < FLT_MIN;
+}
 struct Div {
-    static float v(float a, float b) { return b == 0.0f ? 0.0f : a / b; }
-    static D2 d(const D2& a, const D2& b) { return a / b; }
+    static float v(float a, float b) { return zeroDivisor(b) ? 0.0f : a / b; }
+    static D2 d(const D2& a, const D2& b) { return zeroDivisor(b.val()) ? D2(0.0f) : a / b; }
     static int i(int a, int b) { return b == 0 ? 0 : a / b; }
 };
 struct Mod {
@@ -328,6 +333,15 @@ void kQuad(ExecState& st, const Instr& in) {
     }
 }
 
+struct Hypot {
+    static D2 d(const D2& a, const D2& b) { return OSL::sqrt(a * a + b * b); }
+    static float v(float a, float b) { return std::sqrt(a * a + b * b); }
+};
+struct Hypot3 {
+    static D2 d(const D2& a, const D2& b, const D2& c) { return OSL::sqrt(a * a + b * b + c * c); }
+    static float v(float a, float b, float c) { return std::sqrt(a * a + b * b + c * c); }
+};
+
 // log(x, base): the natural logarithms' quotient, 0 where the base's logarithm is 0.
 struct LogBase {
     static D2 d(const D2& x, const D2& b) {
@@ -591,6 +605,8 @@ int selectMathKernel(KernelChoice& k) {
             if (op == e.first) return e.second(k), 1;
     }
     if (op == "log" && n == 3) return pickBinaryFloat<LogBase>(k), 1;
+    if (op == "hypot" && n == 3) return pickBinaryFloat<Hypot>(k), 1;
+    if (op == "hypot" && n == 4) return pickTernary<Hypot3>(k), 1;
     if (op == "smooth_linearstep" && n == 5)
         return k.in.fn =
                    k.arg(0).derivs ? kQuad<SmoothLinearstep, true> : kQuad<SmoothLinearstep, false>,
