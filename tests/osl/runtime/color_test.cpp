@@ -171,6 +171,6 @@ TEST(ColorSystem, WavelengthColorMatchesReferenceImage) {
         ref.getpixel(x, 10, px, 3);
         for (int c = 0; c < 3; ++c) EXPECT_NEAR(got[c], px[c], 1e-5f) << "x " << x << " c " << c;
     }
-    EXPECT_EQ(cs.wavelengthColor(379.0f), Vec3(0.0f));
+    EXPECT_EQ(cs.wavelengthColor(370.0f), Vec3(0.0f));
     EXPECT_EQ(cs.wavelengthColor(781.0f), Vec3(0.0f));
 }
