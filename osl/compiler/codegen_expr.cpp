@@ -611,7 +611,10 @@ Symbol* CodeGen::ternary(const Node* e) {
 Symbol* CodeGen::typeCtor(const Node* e) {
     TypeSpec t = resolveType(e->typeName, e);
     std::vector<Symbol*> args;
-    for (const auto& k : e->kids) args.push_back(expr(k.get()));
+    // A cast steers an overloaded call toward the cast's type: `(color) noise(P)` is the
+    // colour noise, not the float one converted.
+    const bool steer = e->isCast && e->kids.size() == 1;
+    for (const auto& k : e->kids) args.push_back(expr(k.get(), steer ? &t : nullptr));
     m_curLine = e->line;
     if (t.is_closure_based() || t.is_structure_based() || t.is_void()) {
         error(e, "Cannot construct a " + t.string());

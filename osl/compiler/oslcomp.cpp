@@ -163,7 +163,9 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
     if (!gen.run(decls, unit)) return false;
     oso = writeOSO(unit, echoed);
     if (toFile) {
-        output = defaultOutput;
+        // Without -o the bytecode is named after the shader it holds, as oslc names it.
+        output = output.empty() && !unit.shaderName.empty() ? unit.shaderName + ".oso"
+                                                            : defaultOutput;
         std::ofstream out(output, std::ios::binary);
         out << oso;
         if (!out) {

@@ -86,3 +86,13 @@ TEST_F(DependencyOutput, NoRuleWithoutTheOption) {
 }
 
 } // namespace
+
+// oslc names the bytecode after the shader it holds, not after the source file.
+TEST_F(DependencyOutput, OutputIsNamedAfterTheShader) {
+    write("source_name.osl", "shader declared_name () { }\n");
+    OSL::OSLCompiler c;
+    ASSERT_TRUE(c.compile("source_name.osl", {"-q"}));
+    EXPECT_EQ(c.output_filename(), "declared_name.oso");
+    EXPECT_TRUE(fs::exists("declared_name.oso"));
+    EXPECT_FALSE(fs::exists("source_name.oso"));
+}

@@ -63,3 +63,20 @@ TEST(LibraryOverloads, MessagesStillRefuseWrongArguments) {
 }
 
 } // namespace
+
+// A cast chooses among overloads that differ only in their result: the colour noise, not the
+// float one converted to grey.
+TEST(LibraryOverloads, CastPicksTheOverloadReturningItsType) {
+    Errors eh;
+    std::string oso = compileOrFail("shader t (output color c = 0, output float f = 0) {\n"
+                                    "    c = (color) noise (\"perlin\", P);\n"
+                                    "    f = (float) noise (\"perlin\", P);\n"
+                                    "}\n",
+                                    eh);
+    ASSERT_FALSE(oso.empty()) << (eh.errors.empty() ? "" : eh.errors[0]);
+    // The colour call writes a colour temporary; the float call a float one.
+    EXPECT_NE(oso.find("temp\tcolor\t$tmp1\t"), std::string::npos) << oso;
+    EXPECT_NE(oso.find("\tnoise\t\t$tmp1 $const"), std::string::npos) << oso;
+    EXPECT_NE(oso.find("temp\tfloat\t$tmp3\t"), std::string::npos) << oso;
+    EXPECT_NE(oso.find("\tnoise\t\t$tmp3 $const"), std::string::npos) << oso;
+}
