@@ -225,7 +225,9 @@ void computeNeeds(ShaderGroup& g) {
     for (const ShaderInstance& inst : g.layers) {
         const ShaderMaster& m = *inst.master;
         for (const MasterSymbol& s : m.symbols)
-            if (s.symtype == SymTypeGlobal && (s.firstRead >= 0 || s.firstWrite >= 0))
+            // A %read/%write range of {2147483647,-1} is the compiler's "never".
+            if (s.symtype == SymTypeGlobal && ((s.firstRead >= 0 && s.firstRead <= s.lastRead) ||
+                                               (s.firstWrite >= 0 && s.firstWrite <= s.lastWrite)))
                 addUnique(n.globals, s.name);
         auto constString = [&](int argIndex, ustring& out) {
             const int sym = m.args[size_t(argIndex)];

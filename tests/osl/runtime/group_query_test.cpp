@@ -161,6 +161,7 @@ TEST_F(GroupQuery, LayersRunOneByOneWithTheirTrace) {
                                 "(node up) enter layer 0 up upstream\n"
                                 "upstream ran\n"
                                 "(node up) exit layer 0 up upstream\n"
+                                "c = 5 5 5\n"
                                 "(node down) exit layer 1 down downstream\n"
                                 "(node up) checking for already-run layer 0 up upstream\n"
                                 "(node up)   taking early exit, already executed layer 0 up "
