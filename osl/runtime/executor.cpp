@@ -256,12 +256,7 @@ void runRange(ExecState& st, int begin, int end) {
     }
 }
 
-void shaderError(ExecState& st, const Instr& in, const std::string& msg) {
-    ShadingContext& ctx = *st.ctx;
-    const ShaderGroup& g = *st.prog->group;
-    const ShaderInstance& inst = g.layers[in.layer];
-    const MasterOp& mop = inst.master->ops[in.masterOp];
-    (void)mop;
+void reportContextError(ShadingContext& ctx, const std::string& msg, bool isError) {
     ShadingSystemImpl& sys = *ctx.system;
     if (!sys.errorRepeats) {
         if (std::find(ctx.errorsSeen.begin(), ctx.errorsSeen.end(), msg) != ctx.errorsSeen.end())
@@ -272,7 +267,14 @@ void shaderError(ExecState& st, const Instr& in, const std::string& msg) {
         sys.message(ctx.output);
         ctx.output.clear();
     }
-    sys.error(msg);
+    if (isError)
+        sys.error(msg);
+    else
+        sys.warning(msg);
+}
+
+void shaderError(ExecState& st, const Instr&, const std::string& msg) {
+    reportContextError(*st.ctx, msg);
 }
 
 namespace {

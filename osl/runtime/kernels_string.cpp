@@ -28,23 +28,11 @@ void reportFromShader(ExecState& st, const Instr& in, bool isError) {
     std::string& buf = st.ctx->scratch;
     buf.clear();
     oslFormat(st, *st.s(in.args[0]), in.args + 1, in.nargs - 1, buf);
-    ShadingContext& ctx = *st.ctx;
-    const std::string msg = std::string(isError ? "Shader error [" : "Shader warning [") +
-                            st.prog->group->layers[size_t(in.layer)].master->name.string() +
-                            "]: " + buf;
-    if (!ctx.system->errorRepeats) {
-        if (std::find(ctx.errorsSeen.begin(), ctx.errorsSeen.end(), msg) != ctx.errorsSeen.end())
-            return;
-        ctx.errorsSeen.push_back(msg);
-    }
-    if (!ctx.output.empty()) {
-        ctx.system->message(ctx.output);
-        ctx.output.clear();
-    }
-    if (isError)
-        ctx.system->error(msg);
-    else
-        ctx.system->warning(msg);
+    reportContextError(*st.ctx,
+                       std::string(isError ? "Shader error [" : "Shader warning [") +
+                           st.prog->group->layers[size_t(in.layer)].master->name.string() +
+                           "]: " + buf,
+                       isError);
 }
 void kError(ExecState& st, const Instr& in) {
     reportFromShader(st, in, true);

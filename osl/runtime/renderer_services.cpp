@@ -1,5 +1,6 @@
 // The default behaviour of RendererServices: no transformations, attributes or messages of its
 // own; texture calls go to the texture system, and their failures to the shader's error output.
+#include "shading_context.h"
 #include "texture_options.h"
 
 #include <OSL/rendererservices.h>

@@ -146,5 +146,8 @@ void resolveUses(ExecState& st, const Instr& in);
 
 // Reports a runtime error of the shader at op `in` (through the system's error handler).
 void shaderError(ExecState& st, const Instr& in, const std::string& msg);
+// Reports a message of the running sample: shader output buffered so far is flushed first, and
+// with error_repeats off a context reports each distinct message once.
+void reportContextError(ShadingContext& ctx, const std::string& msg, bool isError = true);
 
 } // namespace OSL

@@ -199,18 +199,4 @@ std::string checkTextureOptions(const Program& prog, const Instr& in, int first,
     return report;
 }
 
-void reportContextError(ShadingContext& ctx, const std::string& msg) {
-    ShadingSystemImpl& sys = *ctx.system;
-    if (!sys.errorRepeats) {
-        if (std::find(ctx.errorsSeen.begin(), ctx.errorsSeen.end(), msg) != ctx.errorsSeen.end())
-            return;
-        ctx.errorsSeen.push_back(msg);
-    }
-    if (!ctx.output.empty()) {
-        sys.message(ctx.output);
-        ctx.output.clear();
-    }
-    sys.error(msg);
-}
-
 } // namespace OSL

@@ -66,8 +66,4 @@ std::string checkTextureOptions(const Program& prog, const Instr& in, int first,
 // OpenImageIO's interpolation code for a name, or -1 when the name is not one.
 int decodeTextureInterp(ustring name);
 
-// Reports an error of the running shader through the shading system; with error_repeats off a
-// context reports each distinct message once.
-void reportContextError(ShadingContext& ctx, const std::string& msg);
-
 } // namespace OSL
