@@ -153,6 +153,8 @@ struct Program {
     std::vector<int> entryOrder;
     bool traceLayers = false; // report entering and leaving layers with the shader output
     bool debugNan = false, debugUninit = false;
+    // What the optimiser did: ops folded, ops dropped, layers merged into identical ones.
+    int optFolded = 0, optRemoved = 0, optMergedLayers = 0;
     std::vector<std::vector<int>> reportedOps; // per layer, when debugUninit: see debug_checks.h
     const ShaderGroup* group = nullptr;
     ShadingSystemImpl* system = nullptr;

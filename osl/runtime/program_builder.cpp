@@ -3,6 +3,7 @@
 // which layers run eagerly.
 #include "debug_checks.h"
 #include "kernels.h"
+#include "optimizer.h"
 #include "shading_system_impl.h"
 
 #include <algorithm>
@@ -478,6 +479,14 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
     prog->traceLayers = sys.debugLayers != 0;
     prog->debugNan = sys.debugNan != 0;
     prog->debugUninit = sys.debugUninit != 0;
+    // Uninitialised-read checks need every op as written, so they run unoptimised.
+    if (!prog->debugUninit) {
+        OptimizerStats stats;
+        optimizeProgram(sys, group, *prog, stats);
+        prog->optFolded = stats.folded;
+        prog->optRemoved = stats.removed;
+        prog->optMergedLayers = stats.mergedLayers;
+    }
     if (prog->debugUninit) {
         markUninitialized(*prog);
         for (int l = 0; l < nlayers; ++l) prog->reportedOps.push_back(reportedOpNumbers(group, l));

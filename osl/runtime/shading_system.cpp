@@ -98,7 +98,13 @@ bool ShadingSystem::attribute(string_view name, TypeDesc type, const void* val) 
             {"countlayerexecs", &ShadingSystemImpl::countLayerExecs},
             {"greedyjit", &ShadingSystemImpl::greedyJit},
             {"lazyglobals", &ShadingSystemImpl::lazyGlobals},
-            {"llvm_debug_layers", &ShadingSystemImpl::debugLayers}};
+            {"llvm_debug_layers", &ShadingSystemImpl::debugLayers},
+            {"opt_constant_fold", &ShadingSystemImpl::optConstantFold},
+            {"opt_elide_useless_ops", &ShadingSystemImpl::optElideUselessOps},
+            {"opt_merge_instances", &ShadingSystemImpl::optMergeInstances},
+            {"opt_merge_instances_with_userdata",
+             &ShadingSystemImpl::optMergeInstancesWithUserdata},
+            {"opt_warnings", &ShadingSystemImpl::optWarnings}};
         for (const auto& e : ints)
             if (name == e.first) {
                 s.*(e.second) = v;
@@ -111,7 +117,6 @@ bool ShadingSystem::attribute(string_view name, TypeDesc type, const void* val) 
                                          "llvm_optimize",
                                          "llvm_debug",
                                          "opt_coalesce_temps",
-                                         "opt_constant_fold",
                                          "opt_peephole",
                                          "opt_elide_unconnected_outputs",
                                          "range_checking",
@@ -160,6 +165,12 @@ bool ShadingSystem::getattribute(string_view name, TypeDesc type, void* val) {
         if (name == "debug_uninit") return *out = s.debugUninit, true;
         if (name == "error_repeats") return *out = s.errorRepeats, true;
         if (name == "lazylayers") return *out = s.lazyLayers, true;
+        if (name == "opt_constant_fold") return *out = s.optConstantFold, true;
+        if (name == "opt_elide_useless_ops") return *out = s.optElideUselessOps, true;
+        if (name == "opt_merge_instances") return *out = s.optMergeInstances, true;
+        if (name == "opt_merge_instances_with_userdata")
+            return *out = s.optMergeInstancesWithUserdata, true;
+        if (name == "opt_warnings") return *out = s.optWarnings, true;
         if (name == "num_closures") return *out = int(s.closures.size()), true;
         return false;
     }
@@ -219,6 +230,16 @@ bool ShadingSystem::getattribute(ShaderGroup* group, string_view name, TypeDesc 
     const ShaderGroup& g = *group;
     if (name == "num_layers" && type == TypeInt) return *(int*)val = int(g.layers.size()), true;
     if (name == "groupname" && type == TypeString) return *(ustring*)val = g.name, true;
+    if (type == TypeInt && g.program &&
+        (name == "stat:ops_folded" || name == "stat:ops_removed" || name == "stat:layers_merged" ||
+         name == "stat:instructions")) {
+        const Program& p = *g.program;
+        *(int*)val = name == "stat:ops_folded"      ? p.optFolded
+                     : name == "stat:ops_removed"   ? p.optRemoved
+                     : name == "stat:layers_merged" ? p.optMergedLayers
+                                                    : int(p.instrs.size());
+        return true;
+    }
     if (name == "pickle" && type == TypeString)
         return *(ustring*)val = ustring(serializeGroup(g)), true;
     if (name == "layer_names" && type.basetype == TypeDesc::STRING) {

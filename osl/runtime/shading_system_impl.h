@@ -44,6 +44,9 @@ public:
     int debug = 0, compileReport = 0, optimize = 2, lockgeom = 1, debugNan = 0, debugUninit = 0;
     int errorRepeats = 0, lazyLayers = 1, countLayerExecs = 0, greedyJit = 0;
     int lazyGlobals = 1, debugLayers = 0;
+    // The optimiser's switches (see optimizer.h).
+    int optConstantFold = 1, optElideUselessOps = 1, optMergeInstances = 1;
+    int optMergeInstancesWithUserdata = 1, optWarnings = 0;
     std::string searchpathShader;
     std::string commonspace = "common";
     std::string colorspace = "Rec709";
