@@ -1,38 +1,12 @@
 // The map's example shader compiled through the registry: its description and block layout.
 #include "compile/compiled_shader_registry.h"
-#include "scratch_host.h"
+#include "map/example_shader.h"
+#include "map_test_host.h"
 
 #include <gtest/gtest.h>
 
-namespace {
-
-const char* kExampleShader =
-    "// A simple example shader with three inputs and two outputs, showing the syntax.\n"
-    "// The OSL language reference describes everything a shader may do.\n"
-    "// The editor's \"More...\" button leads to more shaders.\n"
-    "//\n"
-    "\n"
-    "shader Example\n"
-    "[[ string help=\"Example shader with three inputs and two outputs,<br>one summing (Out), "
-    "one mixing (Mix).  \", string URL =\"https://example.org/osl\" ]]\n"
-    "(\n"
-    "\t// Inputs\n"
-    "\tcolor Input_A = 0.5 [[ string label = \"A\"]],\n"
-    "\tcolor Input_B = 0.5 [[ string label = \"B\"]],\n"
-    "\tfloat Mixer   = 0.5 [[ float min = 0.0, float max = 1.0 ]],\n"
-    "\t// Outputs\n"
-    "\toutput color Out = 0.0,\n"
-    "\toutput color Mix = 0.0\n"
-    ")\n"
-    "{\n"
-    "\tOut = Input_A + Input_B; // Sum\n"
-    "\tMix = mix(Input_A, Input_B, Mixer); // Mix\n"
-    "}\n";
-
-} // namespace
-
 TEST(ExampleShader, CompilesToFiveParametersTwoOutputsAndTheirEntries) {
-    ScratchHostRoot();
+    MapTestRoot();
     CompiledShaderRegistry& registry = CompiledShaderRegistry::Instance();
     const SourceKey key = SourceKeyOf(kExampleShader);
     ASSERT_TRUE(registry.Compile(kExampleShader, nullptr, L"Example.osl"));
