@@ -283,7 +283,7 @@ void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
     }
     m_currentFunction = fn;
     m_sawReturn = false;
-    InlineFrame frame{fn, fn->ret.is_void() ? nullptr : temp(fn->ret), {}};
+    InlineFrame frame{fn, fn->ret.is_void() ? nullptr : temp(fn->ret), {}, {}};
     m_inline.push_back(frame);
     pushScope();
     for (const auto& s : n->body->kids) statement(s.get());
@@ -802,7 +802,7 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
         assignInto(var, val, at);
         return;
     }
-    Symbol* val = expr(init, &t);
+    Symbol* val = exprInto(init, var, &t);
     if (!val) return;
     if (t.is_structure_based() || val->type.is_structure_based()) {
         if (!(t == val->type) && !equivalent(t, val->type)) {
@@ -904,7 +904,7 @@ void CodeGen::returnStatement(const Node* s) {
             return;
         }
         TypeSpec rt = m_inline[fi].fn->ret;
-        Symbol* v = expr(s->kid(0), &rt);
+        Symbol* v = exprInto(s->kid(0), m_inline[fi].result, &rt);
         InlineFrame& f = m_inline[fi];
         if (!assignCompatible(f.fn->ret, v->type)) {
             error(s, "Cannot return a '" + v->type.string() + "' from '" + f.fn->ret.string() +
@@ -918,6 +918,8 @@ void CodeGen::returnStatement(const Node* s) {
     }
     int op = emit("return", {}, "");
     m_inline[fi].returnOps.push_back(op);
+    // oslc keeps the `return` after a conditional expression even at the end of the body.
+    if (s->kid(0) && s->kid(0)->kind == NodeKind::Ternary) m_inline[fi].keptReturns.insert(op);
 }
 
 } // namespace OSL::pvt

@@ -45,6 +45,7 @@ private:
         FunctionSymbol* fn;
         Symbol* result;
         std::vector<int> returnOps; // `return` ops whose target is the end of the body
+        std::set<int> keptReturns;  // `return` ops oslc keeps even when they end the body
     };
     struct LoopFrame {
         bool any = false;
@@ -101,9 +102,10 @@ private:
     Symbol* unary(const Node* e);
     Symbol* incdec(const Node* e);
     Symbol* assign(const Node* e);
-    Symbol* ternary(const Node* e);
+    Symbol* ternary(const Node* e, Symbol* dest = nullptr);
     Symbol* typeCtor(const Node* e);
-    Symbol* call(const Node* e, const TypeSpec* expected);
+    Symbol* foldTriple(const TypeSpec& t, const std::vector<Symbol*>& args);
+    Symbol* call(const Node* e, const TypeSpec* expected, Symbol* dest = nullptr);
     Symbol* structCtor(const Node* e, int structId);
     Symbol* initList(const Node* e, const TypeSpec& t);
     Symbol* indexRead(const Node* e);
@@ -120,7 +122,9 @@ private:
     Symbol* operatorCall(const std::string& opname, const std::vector<Symbol*>& args,
                          const Node* at);
     Symbol* inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
-                       std::vector<LRef>& argRefs);
+                       std::vector<LRef>& argRefs, Symbol* dest = nullptr);
+    Symbol* exprInto(const Node* e, Symbol* dest, const TypeSpec* expected);
+    bool canTarget(const Symbol* dest, const TypeSpec& t) const;
     FunctionSymbol* resolveOverload(const std::string& name, const std::vector<TypeSpec>& argTypes,
                                     const Node* at, const TypeSpec* expected, bool report = true);
     Symbol* builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,

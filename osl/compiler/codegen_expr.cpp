@@ -133,6 +133,7 @@ Symbol* CodeGen::convert(Symbol* v, const TypeSpec& to, const Node* at) {
 }
 
 void CodeGen::assignInto(Symbol* dst, Symbol* src, const Node* at) {
+    if (dst == src) return; // computed in place (see exprInto)
     if (dst->type.is_structure_based()) {
         if (!equivalent(dst->type, src->type) || dst->fields.size() != src->fields.size()) return;
         for (size_t i = 0; i < dst->fields.size(); ++i)
@@ -150,8 +151,11 @@ void CodeGen::assignInto(Symbol* dst, Symbol* src, const Node* at) {
 // A value computed into a fresh temporary by the op just emitted is written straight into its
 // destination instead, as oslc generates an expression into the variable it is assigned to.
 bool CodeGen::retarget(Symbol* dst, Symbol* src) {
+    // Triples of any kind share one layout, so a vector op may write a point (as oslc does).
+    bool sameKind = dst->type == src->type ||
+                    (dst->type.is_triple() && src->type.is_triple() && !src->type.is_array());
     if (src->symtype != SymTypeTemp || !src->fields.empty() || src->bornAt < 0 ||
-        dst->type.is_array() || !(dst->type == src->type) || m_ops->empty())
+        dst->type.is_array() || !sameKind || m_ops->empty())
         return false;
     int last = int(m_ops->size()) - 1;
     Op& op = (*m_ops)[last];
@@ -536,7 +540,8 @@ Symbol* CodeGen::assign(const Node* e) {
             store(r, v, e);
             return v;
         }
-        Symbol* v = expr(rhs, &r.type);
+        bool whole = !r.index && !r.comp && r.sym && !r.sym->isConst();
+        Symbol* v = whole ? exprInto(rhs, r.sym, &r.type) : expr(rhs, &r.type);
         m_curLine = e->line;
         const TypeSpec& t = r.type;
         std::string lhsName = e->kid(0)->kind == NodeKind::VarRef ? e->kid(0)->name : "";
@@ -580,12 +585,17 @@ Symbol* CodeGen::assign(const Node* e) {
     bool direct = !r.index && !r.comp && equivalent(rt, cur->type);
     Symbol* dst = direct ? r.sym : temp(rt);
     if (direct) checkWritable(r.sym, e);
+    // Updating a read-only global in place is allowed, with a warning (a plain `=` is refused).
+    Symbol* root = r.sym;
+    while (root && root->structParent) root = root->structParent;
+    if (root && root->symtype == SymTypeGlobal && m_nonWritableGlobals.count(root->name))
+        warning(e, "cannot write to non-output parameter \"" + root->name + "\"");
     emit(names.at(op), {dst, cur, v});
     if (!direct) store(r, dst, e);
     return dst;
 }
 
-Symbol* CodeGen::ternary(const Node* e) {
+Symbol* CodeGen::ternary(const Node* e, Symbol* dest) {
     Symbol* c = expr(e->kid(0));
     m_curLine = e->line;
     if (!c->type.is_int()) {
@@ -594,18 +604,39 @@ Symbol* CodeGen::ternary(const Node* e) {
         c = t;
     }
     int ifop = emit("if", {c}, "r");
-    // The result type comes from the branches; generate them into scratch to learn it first.
-    Symbol* a = expr(e->kid(1));
-    Symbol* r = temp(a->type);
-    assignInto(r, a, e);
+    // Each branch computes straight into the destination when there is one; otherwise the
+    // result type comes from the first branch.
+    Symbol* a = dest ? exprInto(e->kid(1), dest, &dest->type) : expr(e->kid(1));
+    Symbol* r = dest ? dest : temp(a->type);
+    // Both branches write r: it must not be retargeted by whatever consumes it afterwards.
+    if (!dest) r->bornAt = ifop;
+    if (!assignCompatible(r->type, a->type))
+        error(e, "Incompatible types in ?: expression: " + r->type.string() + " and " +
+                     a->type.string());
+    else
+        assignInto(r, a, e);
     int elseStart = nextOp();
-    Symbol* b = expr(e->kid(2), &a->type);
-    if (!assignCompatible(r->type, b->type))
+    Symbol* b = dest ? exprInto(e->kid(2), dest, &dest->type) : expr(e->kid(2), &a->type);
+    if (!assignCompatible(r->type, b->type) || !assignCompatible(a->type, b->type))
         error(e, "Incompatible types in ?: expression: " + a->type.string() + " and " +
                      b->type.string());
-    assignInto(r, b, e);
+    else
+        assignInto(r, b, e);
     (*m_ops)[ifop].jumps = {elseStart, nextOp()};
     return r;
+}
+
+// A triple built from numeric constants is itself a constant, as oslc makes it.
+Symbol* CodeGen::foldTriple(const TypeSpec& t, const std::vector<Symbol*>& args) {
+    if (!t.is_triple() || t.is_array() || (args.size() != 1 && args.size() != 3)) return nullptr;
+    std::vector<float> fv;
+    for (const Symbol* a : args) {
+        if (!a->isConst() || a->type.is_array() || !a->type.is_scalarnum()) return nullptr;
+        if (a->type.is_int() ? a->ivals.empty() : a->fvals.empty()) return nullptr;
+        fv.push_back(a->type.is_int() ? float(a->ivals[0]) : a->fvals[0]);
+    }
+    if (fv.size() == 1) fv.assign(3, fv[0]);
+    return constant(t, {}, fv, {});
 }
 
 Symbol* CodeGen::typeCtor(const Node* e) {
@@ -621,6 +652,7 @@ Symbol* CodeGen::typeCtor(const Node* e) {
         return temp(t);
     }
     if (args.size() == 1 && !args[0]->type.is_string()) {
+        if (Symbol* folded = foldTriple(t, args)) return folded;
         const TypeSpec& from = args[0]->type;
         if (from.is_structure_based() || from.is_closure_based() || from.is_array() ||
             (from.is_string() != t.is_string()) || (t.is_scalarnum() && !from.is_scalarnum()) ||
@@ -650,6 +682,7 @@ Symbol* CodeGen::typeCtor(const Node* e) {
         error(e, "No matching function call to '" + t.string() + " (" + sig + ")'");
         return temp(t);
     }
+    if (Symbol* folded = foldTriple(t, args)) return folded;
     for (size_t i = first; i < args.size(); ++i)
         if (args[i]->type.is_int()) args[i] = convert(args[i], kFloat, e);
     Symbol* r = temp(t);
@@ -729,8 +762,9 @@ static int conversionCost(const TypeSpec& arg, const TypeSpec& param, bool outpu
         return (a == p || equivalent(a, p)) ? 0 : -1;
     }
     if (arg.is_array() || param.is_array()) return equivalent(arg, param) ? 0 : -1;
+    // A struct of another name but the same layout is accepted, after the struct itself.
     if (arg.is_structure_based() || param.is_structure_based())
-        return equivalent(arg, param) ? 0 : -1;
+        return equivalent(arg, param) ? 1 : -1;
     if (arg.is_closure_based() || param.is_closure_based())
         return (arg.is_closure_based() && param.is_closure_based()) ? 0 : -1;
     if (arg.is_triple() && param.is_triple()) return output ? -1 : 1;
@@ -797,17 +831,6 @@ FunctionSymbol* CodeGen::resolveOverload(const std::string& name,
     for (auto& s : scored)
         if (s.first == best) ties.push_back(s.second);
     if (ties.size() == 1) return ties[0];
-    if (expected)
-        for (auto* f : ties)
-            if (f->ret == *expected) return f;
-    // Later declarations win over earlier ones with the same parameters (user overrides).
-    std::stable_sort(ties.begin(), ties.end(), [](FunctionSymbol* a, FunctionSymbol* b) {
-        return returnRank(a->ret) < returnRank(b->ret);
-    });
-    bool allStruct = std::all_of(ties.begin(), ties.end(),
-                                 [](FunctionSymbol* f) { return f->ret.is_structure_based(); });
-    bool user = std::any_of(ties.begin(), ties.end(),
-                            [](FunctionSymbol* f) { return f->file != "stdosl.h"; });
     bool sameParams = true;
     for (auto* f : ties) {
         for (size_t i = 0; i < f->params.size() && i < ties[0]->params.size(); ++i)
@@ -824,6 +847,17 @@ FunctionSymbol* CodeGen::resolveOverload(const std::string& name,
                 }))
                 return r->get();
     }
+    if (expected)
+        for (auto* f : ties)
+            if (f->ret == *expected) return f;
+    // Later declarations win over earlier ones with the same parameters (user overrides).
+    std::stable_sort(ties.begin(), ties.end(), [](FunctionSymbol* a, FunctionSymbol* b) {
+        return returnRank(a->ret) < returnRank(b->ret);
+    });
+    bool allStruct = std::all_of(ties.begin(), ties.end(),
+                                 [](FunctionSymbol* f) { return f->ret.is_structure_based(); });
+    bool user = std::any_of(ties.begin(), ties.end(),
+                            [](FunctionSymbol* f) { return f->file != "stdosl.h"; });
     if (report && user) {
         if (allStruct) {
             std::string msg =
@@ -838,9 +872,8 @@ FunctionSymbol* CodeGen::resolveOverload(const std::string& name,
         std::string msg = "Ambiguous call to '" + name + " (" + argSig +
                           ")'\n  Chosen function is:\n" + location(ties[0]) +
                           "  Other candidates are:\n";
-        for (auto r = cands.rbegin(); r != cands.rend(); ++r)
-            if (r->get() != ties[0] && std::find(ties.begin(), ties.end(), r->get()) != ties.end())
-                msg += location(r->get());
+        // In the order of preference by return type, as oslc lists them.
+        for (size_t i = 1; i < ties.size(); ++i) msg += location(ties[i]);
         msg.pop_back();
         warning(at, msg);
     }
@@ -871,7 +904,33 @@ Symbol* CodeGen::structCtor(const Node* e, int structId) {
     return r;
 }
 
-Symbol* CodeGen::call(const Node* e, const TypeSpec* expected) {
+bool CodeGen::canTarget(const Symbol* dest, const TypeSpec& t) const {
+    if (!dest || dest->type.is_array() || dest->type.is_structure_based() ||
+        !dest->fields.empty() || dest->type.is_closure_based() || t.is_array() ||
+        t.is_structure_based())
+        return false;
+    return dest->type == t || (dest->type.is_triple() && t.is_triple());
+}
+
+// Generates `e` with its value written into `dest` where oslc does so: a conditional expression
+// computes each branch into it and a user function returns into it. Other expressions are
+// generated as usual (their last op is retargeted by assignInto).
+Symbol* CodeGen::exprInto(const Node* e, Symbol* dest, const TypeSpec* expected) {
+    if (e && dest && !m_checkOnly && !dest->type.is_array() && !dest->type.is_closure_based() &&
+        !dest->type.is_structure_based() && dest->fields.empty()) {
+        if (e->kind == NodeKind::Ternary) {
+            m_curLine = e->line, m_curFile = e->file;
+            return ternary(e, dest);
+        }
+        if (e->kind == NodeKind::Call) {
+            m_curLine = e->line, m_curFile = e->file;
+            return call(e, expected, dest);
+        }
+    }
+    return expr(e, expected);
+}
+
+Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
     auto st = m_structs.find(e->name);
     if (st != m_structs.end()) return structCtor(e, st->second);
     bool shadowed = false;
@@ -931,7 +990,12 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected) {
                           " (output parameter \"" + fn->params[i].name + "\")");
     }
     if (fn->builtin) return builtinCall(fn, e, args, refs, expected);
-    return inlineCall(fn, e, args, refs);
+    if (dest &&
+        (!canTarget(dest, fn->ret) || std::find(args.begin(), args.end(), dest) != args.end()))
+        dest = nullptr;
+    for (const LRef& r : refs)
+        if (dest && r.sym == dest) dest = nullptr;
+    return inlineCall(fn, e, args, refs, dest);
 }
 
 Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
@@ -1009,7 +1073,7 @@ Symbol* CodeGen::operatorCall(const std::string& opname, const std::vector<Symbo
 }
 
 Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
-                            std::vector<LRef>& refs) {
+                            std::vector<LRef>& refs, Symbol* dest) {
     for (const auto& f : m_inline)
         if (f.fn == fn) {
             error(e, "Recursive call to function '" + fn->name + "' is not allowed");
@@ -1026,7 +1090,7 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
     }
     const Node* decl = fn->decl;
     int callop = emit("functioncall", {constString(fn->name)}, "r");
-    Symbol* result = fn->ret.is_void() ? nullptr : temp(fn->ret);
+    Symbol* result = fn->ret.is_void() ? nullptr : dest ? dest : temp(fn->ret);
     std::vector<std::pair<size_t, Symbol*>> writeBacks;
     auto savedScopes = std::move(m_scopes);
     int savedShaderDepth = m_shaderScopeDepth;
@@ -1054,7 +1118,7 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
         }
         m_scopes.back().vars[p.name] = a;
     }
-    m_inline.push_back({fn, result, {}});
+    m_inline.push_back({fn, result, {}, {}});
     ++m_silent;
     FunctionSymbol* savedFn = m_currentFunction;
     m_currentFunction = nullptr;
@@ -1073,7 +1137,8 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
     InlineFrame frame = m_inline.back();
     m_inline.pop_back();
     // A `return` as the last op needs no jump: drop it.
-    if (!frame.returnOps.empty() && frame.returnOps.back() == nextOp() - 1) {
+    if (!frame.returnOps.empty() && frame.returnOps.back() == nextOp() - 1 &&
+        !frame.keptReturns.count(frame.returnOps.back())) {
         int last = nextOp() - 1;
         m_ops->pop_back();
         for (int i = callop; i < last; ++i)

@@ -119,32 +119,37 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
     if (!pp.run(source, display, userPre)) return false;
     std::string defaultOutput =
         output.empty() ? std::filesystem::path(filename).stem().string() + ".oso" : output;
-    if (deps.wanted) {
+    // The make rule, once the bytecode's name is known: without -o the bytecode (and so the
+    // rule's target and its .d file) is named after the shader, which only compiling tells.
+    auto writeDeps = [&](const std::string& osoName) {
         std::vector<std::string> files;
         if (deps.system) files.push_back(stdoslpath.empty() ? stdoslName : stdoslpath);
         const auto& inc = pp.includedFiles();
         for (size_t k = firstUserInclude; k < inc.size(); ++k)
             if (deps.system || !isBuiltinHeader(inc[k])) files.push_back(inc[k]);
-        std::string text = (deps.target.empty() ? defaultOutput : deps.target) + ": " + display;
+        std::string text = (deps.target.empty() ? osoName : deps.target) + ": " + display;
         for (const auto& f : files) text += " \\\n  " + f;
         text += "\n";
         std::string depFile = deps.file;
         if (depFile.empty() && !deps.toStdout)
-            depFile = std::filesystem::path(defaultOutput).replace_extension(".d").string();
+            depFile = std::filesystem::path(osoName).replace_extension(".d").string();
         if (depFile.empty() || depFile == "-") {
             std::fputs(text.c_str(), stdout);
             std::fflush(stdout);
-            if (deps.toStdout) return true; // -M, -MM: the rule is all that is asked for
-        } else {
-            std::ofstream df(depFile, std::ios::binary);
-            df << text;
-            if (!df) {
-                diag.error(display, 0, "could not write " + depFile);
-                return false;
-            }
+            return true;
         }
-    }
+        std::ofstream df(depFile, std::ios::binary);
+        df << text;
+        if (!df) {
+            diag.error(display, 0, "could not write " + depFile);
+            return false;
+        }
+        return true;
+    };
+    // -M and -MM ask for the rule alone, without compiling.
+    if (deps.wanted && deps.toStdout) return writeDeps(defaultOutput);
     if (preprocessOnly) {
+        if (deps.wanted && !writeDeps(defaultOutput)) return false;
         oso = userPre;
         if (toFile) {
             std::ofstream out(output.empty() ? std::string("/dev/stdout") : output);
@@ -162,10 +167,12 @@ bool OSLCompilerImpl::compile(const std::string& source, const std::string& file
     ShaderUnit unit;
     if (!gen.run(decls, unit)) return false;
     oso = writeOSO(unit, echoed);
+    // Without -o the bytecode is named after the shader it holds, as oslc names it.
+    std::string osoName =
+        output.empty() && !unit.shaderName.empty() ? unit.shaderName + ".oso" : defaultOutput;
+    if (deps.wanted && !writeDeps(osoName)) return false;
     if (toFile) {
-        // Without -o the bytecode is named after the shader it holds, as oslc names it.
-        output = output.empty() && !unit.shaderName.empty() ? unit.shaderName + ".oso"
-                                                            : defaultOutput;
+        output = osoName;
         std::ofstream out(output, std::ios::binary);
         out << oso;
         if (!out) {

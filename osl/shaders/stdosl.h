@@ -1,6 +1,8 @@
 // The OSL standard library as the Tessel compiler sees it. A function declared here without a
 // body is built in: a call becomes an op of the same name (or the name given by its "op"
-// metadata). A trailing `...` accepts any further arguments (options, format values).
+// metadata). A trailing `...` accepts any further arguments (options, format values). Functions
+// with a body are ordinary OSL, inlined at each call after a `functioncall` op, exactly like the
+// reference library, so that compiled shaders only use ops every OSL runtime provides.
 #ifndef STDOSL_H
 #define STDOSL_H
 
@@ -29,13 +31,13 @@
 #define OSL_BINARY(name) float name(float a, float b); color name(color a, color b); \
     point name(point a, point b); vector name(vector a, vector b); normal name(normal a, normal b);
 
-OSL_UNARY(radians) OSL_UNARY(degrees) OSL_UNARY(cos) OSL_UNARY(sin) OSL_UNARY(tan)
+OSL_UNARY(cos) OSL_UNARY(sin) OSL_UNARY(tan)
 OSL_UNARY(acos) OSL_UNARY(asin) OSL_UNARY(atan) OSL_UNARY(cosh) OSL_UNARY(sinh) OSL_UNARY(tanh)
 OSL_UNARY(exp) OSL_UNARY(exp2) OSL_UNARY(expm1) OSL_UNARY(log) OSL_UNARY(log2) OSL_UNARY(log10)
 OSL_UNARY(logb) OSL_UNARY(sqrt) OSL_UNARY(inversesqrt) OSL_UNARY(cbrt) OSL_UNARY(abs)
 OSL_UNARY(fabs) OSL_UNARY(sign) OSL_UNARY(floor) OSL_UNARY(ceil) OSL_UNARY(round) OSL_UNARY(trunc)
 OSL_UNARY(erf) OSL_UNARY(erfc)
-OSL_BINARY(atan2) OSL_BINARY(pow) OSL_BINARY(fmod) OSL_BINARY(mod) OSL_BINARY(min) OSL_BINARY(max)
+OSL_BINARY(atan2) OSL_BINARY(pow) OSL_BINARY(fmod) OSL_BINARY(min) OSL_BINARY(max)
 OSL_BINARY(step)
 int abs(int x);
 int fabs(int x);
@@ -51,14 +53,6 @@ color fmod(color a, float b);
 point fmod(point a, float b);
 vector fmod(vector a, float b);
 normal fmod(normal a, float b);
-color mod(color a, float b);
-point mod(point a, float b);
-vector mod(vector a, float b);
-normal mod(normal a, float b);
-float log(float x, float b);
-color log(color x, float b);
-float hypot(float a, float b);
-float hypot(float a, float b, float c);
 int isnan(float x);
 int isinf(float x);
 int isfinite(float x);
@@ -68,19 +62,14 @@ void sincos(point x, output point s, output point c);
 void sincos(vector x, output vector s, output vector c);
 void sincos(normal x, output normal s, output normal c);
 
-#define OSL_CLAMPMIX(T) T clamp(T x, T lo, T hi); T mix(T x, T y, T a); T select(T x, T y, T c); \
-    T linearstep(T e0, T e1, T x); T smoothstep(T e0, T e1, T x); T smooth_linearstep(T e0, T e1, T x, T eps);
+#define OSL_CLAMPMIX(T) T mix(T x, T y, T a); T select(T x, T y, T c);
 OSL_CLAMPMIX(float) OSL_CLAMPMIX(color) OSL_CLAMPMIX(point) OSL_CLAMPMIX(vector) OSL_CLAMPMIX(normal)
-int clamp(int x, int lo, int hi);
+float smoothstep(float e0, float e1, float x);
 int select(int x, int y, int c);
 color mix(color x, color y, float a);
 point mix(point x, point y, float a);
 vector mix(vector x, vector y, float a);
 normal mix(normal x, normal y, float a);
-color clamp(color x, float lo, float hi);
-point clamp(point x, float lo, float hi);
-vector clamp(vector x, float lo, float hi);
-normal clamp(normal x, float lo, float hi);
 float select(float x, float y, int c);
 color select(color x, color y, int c);
 point select(point x, point y, int c);
@@ -97,20 +86,8 @@ vector cross(vector a, vector b);
 float length(vector v);
 float length(normal v);
 float distance(point a, point b);
-float distance(point a, point b, point q);
 vector normalize(vector v);
 normal normalize(normal v);
-vector faceforward(vector N, vector I, vector Nref);
-vector faceforward(vector N, vector I);
-normal faceforward(normal N, vector I, vector Nref);
-normal faceforward(normal N, vector I);
-vector reflect(vector I, vector N);
-vector refract(vector I, vector N, float eta);
-void fresnel(vector I, normal N, float eta, output float Kr, output float Kt, output vector R,
-             output vector T);
-void fresnel(vector I, normal N, float eta, output float Kr, output float Kt);
-point rotate(point p, float angle, point a, point b);
-point rotate(point p, float angle, vector axis);
 float area(point p);
 vector calculatenormal(point p);
 float filterwidth(float x);
@@ -118,22 +95,15 @@ vector filterwidth(point x);
 vector filterwidth(vector x);
 #define OSL_DERIV(T) T Dx(T x); T Dy(T x); T Dz(T x);
 OSL_DERIV(float) OSL_DERIV(color) OSL_DERIV(point) OSL_DERIV(vector) OSL_DERIV(normal)
-float aastep(float edge, float s);
-float aastep(float edge, float s, float fw);
-float aastep(float edge, float s, float dedge, float ds);
 
-point transform(string to, point p);
 point transform(string from, string to, point p);
 point transform(matrix m, point p);
-vector transform(string to, vector p) [[ string op = "transformv" ]];
 vector transform(string from, string to, vector p) [[ string op = "transformv" ]];
 vector transform(matrix m, vector p) [[ string op = "transformv" ]];
-normal transform(string to, normal p) [[ string op = "transformn" ]];
 normal transform(string from, string to, normal p) [[ string op = "transformn" ]];
 normal transform(matrix m, normal p) [[ string op = "transformn" ]];
 float transformu(string to, float x);
 float transformu(string from, string to, float x);
-color transformc(string to, color c);
 color transformc(string from, string to, color c);
 float determinant(matrix m);
 matrix transpose(matrix m);
@@ -248,13 +218,218 @@ void exit();
 // Closures: a call becomes a `closure` op naming the closure.
 #define OSL_CLOSURE(name) closure color name(...) [[ int builtin_closure = 1 ]];
 OSL_CLOSURE(diffuse) OSL_CLOSURE(oren_nayar) OSL_CLOSURE(translucent) OSL_CLOSURE(phong)
-OSL_CLOSURE(ward) OSL_CLOSURE(microfacet) OSL_CLOSURE(reflection) OSL_CLOSURE(refraction)
+OSL_CLOSURE(ward) OSL_CLOSURE(refraction)
 OSL_CLOSURE(transparent) OSL_CLOSURE(debug) OSL_CLOSURE(holdout) OSL_CLOSURE(background)
 OSL_CLOSURE(emission) OSL_CLOSURE(subsurface) OSL_CLOSURE(oren_nayar_diffuse_bsdf)
 OSL_CLOSURE(burley_diffuse_bsdf) OSL_CLOSURE(dielectric_bsdf) OSL_CLOSURE(conductor_bsdf)
 OSL_CLOSURE(generalized_schlick_bsdf) OSL_CLOSURE(translucent_bsdf) OSL_CLOSURE(transparent_bsdf)
 OSL_CLOSURE(subsurface_bssrdf) OSL_CLOSURE(sheen_bsdf) OSL_CLOSURE(uniform_edf)
 OSL_CLOSURE(anisotropic_vdf) OSL_CLOSURE(medium_vdf) OSL_CLOSURE(layer)
+
+// Closures reached through a shorter form: the short form supplies the omitted arguments.
+closure color reflection(normal N, float eta, ...) [[ int builtin_closure = 1 ]];
+closure color microfacet(string distribution, normal N, vector U, float xalpha, float yalpha,
+                         float eta, int refr, ...) [[ int builtin_closure = 1 ]];
+closure color reflection(normal N) { return reflection(N, 0.0); }
+closure color microfacet(string distribution, normal N, float alpha, float eta, int refr)
+{
+    return microfacet(distribution, N, vector(0.0, 0.0, 0.0), alpha, alpha, eta, refr);
+}
+
+// ---------------------------------------------------------------------------------------------
+// Library functions written in OSL. Triples are handled a component at a time where the
+// function is defined per component.
+
+#define OSL_DEG_PER_RAD (180.0 / M_PI)
+#define OSL_RAD_PER_DEG (M_PI / 180.0)
+#define OSL_ANGLES(T) \
+    T degrees(T rad) { return rad * OSL_DEG_PER_RAD; } \
+    T radians(T deg) { return deg * OSL_RAD_PER_DEG; }
+OSL_FLOATS(OSL_ANGLES)
+
+float hypot(float a, float b) { return sqrt(a * a + b * b); }
+float hypot(float a, float b, float c) { return sqrt(a * a + b * b + c * c); }
+
+// The logarithm to any base, through the natural one.
+#define OSL_LOGB(T) T log(T x, float base) { return log(x) / log(base); }
+OSL_FLOATS(OSL_LOGB)
+
+// Remainder that takes the sign of the divisor: a - b*floor(a/b).
+#define OSL_MOD(T) \
+    T mod(T a, T b) { return a - b * floor(a / b); }
+OSL_FLOATS(OSL_MOD)
+#define OSL_MODF(T) \
+    T mod(T a, float b) { return a - b * floor(a / b); }
+OSL_TRIPLES(OSL_MODF)
+
+#define OSL_CLAMP(T) T clamp(T x, T lo, T hi) { return max(min(x, hi), lo); }
+OSL_FLOATS(OSL_CLAMP)
+int clamp(int x, int lo, int hi) { return max(min(x, hi), lo); }
+
+float sqr(float x) { return x * x; }
+
+// A step widened into a linear ramp from e0 to e1; a plain step where the two meet.
+float linearstep(float e0, float e1, float x)
+{
+    float ramp;
+    if (e0 != e1) {
+        float inside = clamp(x, e0, e1);
+        ramp = (inside - e0) / (e1 - e0);
+    } else {
+        ramp = step(e0, x);
+    }
+    return ramp;
+}
+
+// The quadratic that rises from 0 with zero slope and reaches slope 1 after `width`.
+float rampup(float x, float width) { return 0.5 / width * x * x; }
+
+// linearstep with its corners rounded off by quadratics `eps` wide on either side.
+float smooth_linearstep(float e0, float e1, float x, float eps)
+{
+    float ramp;
+    if (e0 != e1) {
+        float scale = 1.0 / (e1 - e0);
+        float e = eps * scale;
+        float t = (x - e0) * scale;
+        if (t <= -e)
+            ramp = 0;
+        else if (t >= e && t <= 1.0 - e)
+            ramp = t;
+        else if (t >= 1.0 + e)
+            ramp = 1;
+        else if (t < e)
+            ramp = rampup(t + e, 2.0 * e);
+        else
+            ramp = 1.0 - rampup(1.0 + e - t, 2.0 * e);
+    } else {
+        ramp = step(e0, x);
+    }
+    return ramp;
+}
+
+#define OSL_PERCOMP3(T, CTOR, name) \
+    T name(T a, T b, T c) \
+    { \
+        return CTOR(name(a[0], b[0], c[0]), name(a[1], b[1], c[1]), name(a[2], b[2], c[2])); \
+    }
+#define OSL_PERCOMP4(T, CTOR, name) \
+    T name(T a, T b, T c, T d) \
+    { \
+        return CTOR(name(a[0], b[0], c[0], d[0]), name(a[1], b[1], c[1], d[1]), \
+                    name(a[2], b[2], c[2], d[2])); \
+    }
+#define OSL_STEPS(T, CTOR) OSL_PERCOMP3(T, CTOR, smoothstep) OSL_PERCOMP3(T, CTOR, linearstep) \
+    OSL_PERCOMP4(T, CTOR, smooth_linearstep)
+OSL_STEPS(color, color) OSL_STEPS(point, vector) OSL_STEPS(vector, vector) OSL_STEPS(normal, vector)
+
+// Antialiased step: the step box-filtered over the combined footprint of edge and s.
+float aastep(float edge, float s, float dedge, float ds)
+{
+    float w = fabs(dedge) + fabs(ds);
+    float hw = 0.5 * w;
+    float lo = edge - hw;
+    return (s <= lo) ? 0.0 : ((s >= edge + hw) ? 1.0 : (s - lo) / w);
+}
+float aastep(float edge, float s, float ds) { return aastep(edge, s, filterwidth(edge), ds); }
+float aastep(float edge, float s)
+{
+    return aastep(edge, s, filterwidth(edge), filterwidth(s));
+}
+
+// Distance from q to the segment a-b.
+float distance(point a, point b, point q)
+{
+    vector ab = b - a;
+    float len2 = dot(ab, ab);
+    if (len2 == 0.0)
+        return distance(q, a);
+    float along = dot(q - a, ab) / len2;
+    return distance(q, a + clamp(along, 0.0, 1.0) * ab);
+}
+
+// N turned to face against I, judged by the reference normal.
+vector faceforward(vector N, vector I, vector Nref) { return (dot(I, Nref) > 0) ? -N : N; }
+vector faceforward(vector N, vector I) { return faceforward(N, I, Ng); }
+normal faceforward(normal N, vector I, normal Nref) { return (dot(I, Nref) > 0) ? -N : N; }
+normal faceforward(normal N, vector I) { return faceforward(N, I, Ng); }
+
+// Mirror direction of I about the unit normal N.
+vector reflect(vector I, vector N) { return I - 2 * dot(N, I) * N; }
+
+// Snell's law; a zero vector on total internal reflection.
+vector refract(vector I, vector N, float eta)
+{
+    float cosi = dot(I, N);
+    float k = 1 - eta * eta * (1 - cosi * cosi);
+    return (k < 0) ? vector(0.0, 0.0, 0.0) : eta * I - N * (eta * cosi + sqrt(k));
+}
+
+// Unpolarised Fresnel reflectance of a dielectric, with the reflected and refracted directions.
+void fresnel(vector I, normal N, float eta, output float Kr, output float Kt, output vector R,
+             output vector T)
+{
+    float c = dot(I, N);
+    if (c < 0)
+        c = -c;
+    R = reflect(I, N);
+    float g = 1.0 / sqr(eta) - 1.0 + c * c;
+    if (g >= 0.0) {
+        g = sqrt(g);
+        float gmc = g - c;
+        float f = (c * (g + c) - 1.0) / (c * gmc + 1.0);
+        f = 0.5 * (1.0 + sqr(f));
+        f *= sqr(gmc / (g + c));
+        Kr = f;
+        Kt = (1.0 - Kr) * eta * eta;
+        T = refract(I, N, eta);
+    } else {
+        Kr = 1.0;
+        Kt = 0.0;
+        T = vector(0.0, 0.0, 0.0);
+    }
+}
+void fresnel(vector I, normal N, float eta, output float Kr, output float Kt)
+{
+    vector R, T;
+    fresnel(I, N, eta, Kr, Kt, R, T);
+}
+
+// Rotation of p by `angle` radians about the line through a and b (right-handed).
+point rotate(point p, float angle, point a, point b)
+{
+    vector axis = normalize(b - a);
+    float s, c;
+    sincos(angle, s, c);
+    float oc = 1.0 - c;
+    float x = axis[0], y = axis[1], z = axis[2];
+    matrix M = matrix(x * x + (1.0 - x * x) * c, x * y * oc + z * s, x * z * oc - y * s, 0.0,
+                      x * y * oc - z * s, y * y + (1.0 - y * y) * c, y * z * oc + x * s, 0.0,
+                      x * z * oc + y * s, y * z * oc - x * s, z * z + (1.0 - z * z) * c, 0.0,
+                      0.0, 0.0, 0.0, 1.0);
+    return transform(M, p - a) + a;
+}
+point rotate(point p, float angle, vector axis)
+{
+    return rotate(p, angle, point(0.0, 0.0, 0.0), axis);
+}
+
+// Transforms from "common" space, and colours from "rgb".
+point transform(string to, point p) { return transform("common", to, p); }
+vector transform(string to, vector v) { return transform("common", to, v); }
+normal transform(string to, normal n) { return transform("common", to, n); }
+color transformc(string to, color c) { return transformc("rgb", to, c); }
+
+#undef OSL_DEG_PER_RAD
+#undef OSL_RAD_PER_DEG
+#undef OSL_ANGLES
+#undef OSL_LOGB
+#undef OSL_MOD
+#undef OSL_MODF
+#undef OSL_CLAMP
+#undef OSL_PERCOMP3
+#undef OSL_PERCOMP4
+#undef OSL_STEPS
 
 #undef OSL_TRIPLES
 #undef OSL_FLOATS

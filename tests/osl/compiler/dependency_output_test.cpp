@@ -96,3 +96,22 @@ TEST_F(DependencyOutput, OutputIsNamedAfterTheShader) {
     EXPECT_TRUE(fs::exists("declared_name.oso"));
     EXPECT_FALSE(fs::exists("source_name.oso"));
 }
+
+// The rule and its file follow the bytecode's name, so they name the shader too.
+TEST_F(DependencyOutput, RuleIsNamedAfterTheShader) {
+    write("source_name.osl", "#include \"myheader.h\"\nshader declared_name () { }\n");
+    OSL::OSLCompiler c;
+    ASSERT_TRUE(c.compile("source_name.osl", {"-q", "-MMD"}));
+    EXPECT_FALSE(fs::exists("source_name.d"));
+    EXPECT_EQ(read("declared_name.d"), "declared_name.oso: source_name.osl \\\n  myheader.h\n");
+    // An explicit output keeps its own name.
+    ASSERT_TRUE(c.compile("source_name.osl", {"-q", "-MMD", "-o", "given.oso"}));
+    EXPECT_EQ(read("given.d"), "given.oso: source_name.osl \\\n  myheader.h\n");
+}
+
+TEST_F(DependencyOutput, FailedCompileWritesNoRule) {
+    write("broken.osl", "shader broken () { undefined_name = 1; }\n");
+    OSL::OSLCompiler c;
+    ASSERT_FALSE(c.compile("broken.osl", {"-q", "-MMD"}));
+    EXPECT_FALSE(fs::exists("broken.d"));
+}
