@@ -6,6 +6,7 @@
 
 #include "hlsl_compile_check.h"
 
+#include <algorithm>
 #include <array>
 #include <cstring>
 #include <string>
@@ -24,6 +25,9 @@ using Float4 = std::array<float, 4>;
 struct Evaluation {
     bool available = false; // false: no Vulkan here, the check cannot run
     bool ok = false;
+    // The device is a CPU implementation (lavapipe): IEEE float arithmetic, each operation
+    // rounded as written unless the shader lets the compiler reassociate it.
+    bool cpuDevice = false;
     std::string error;
     std::vector<Float4> values;
 };
@@ -50,9 +54,11 @@ public:
         return compute;
     }
     bool Available() const { return m_device != VK_NULL_HANDLE; }
+    bool CpuDevice() const { return m_cpuDevice; }
 
-    bool Run(const std::vector<uint32_t>& spirv, size_t count, std::vector<Float4>& values,
-             std::string& error) {
+    // The buffer starts as `initial` (zeros past its end).
+    bool Run(const std::vector<uint32_t>& spirv, size_t count, const std::vector<Float4>& initial,
+             std::vector<Float4>& values, std::string& error) {
         const VkDeviceSize size = count * sizeof(Float4);
         auto bufferInfo = Info<VkBufferCreateInfo>(VK_STRUCTURE_TYPE_BUFFER_CREATE_INFO);
         bufferInfo.size = size;
@@ -72,6 +78,7 @@ public:
         void* mapped = nullptr;
         f.MapMemory(m_device, memory, 0, size, 0, &mapped);
         std::memset(mapped, 0, size);
+        std::memcpy(mapped, initial.data(), std::min(initial.size(), count) * sizeof(Float4));
 
         auto moduleInfo =
             Info<VkShaderModuleCreateInfo>(VK_STRUCTURE_TYPE_SHADER_MODULE_CREATE_INFO);
@@ -174,6 +181,7 @@ private:
     TESSEL_VK_FUNCTION(EnumeratePhysicalDevices)                                                   \
     TESSEL_VK_FUNCTION(GetPhysicalDeviceQueueFamilyProperties)                                     \
     TESSEL_VK_FUNCTION(GetPhysicalDeviceMemoryProperties)                                          \
+    TESSEL_VK_FUNCTION(GetPhysicalDeviceProperties)                                                \
     TESSEL_VK_FUNCTION(CreateDevice)                                                               \
     TESSEL_VK_FUNCTION(GetDeviceQueue)                                                             \
     TESSEL_VK_FUNCTION(CreateCommandPool)                                                          \
@@ -278,6 +286,9 @@ private:
         poolInfo.queueFamilyIndex = family;
         if (f.CreateCommandPool(device, &poolInfo, nullptr, &m_commandPool) != VK_SUCCESS)
             return false;
+        VkPhysicalDeviceProperties properties;
+        f.GetPhysicalDeviceProperties(physical, &properties);
+        m_cpuDevice = properties.deviceType == VK_PHYSICAL_DEVICE_TYPE_CPU;
         m_hostMemoryType = type;
         m_device = device;
         return true;
@@ -289,17 +300,22 @@ private:
     VkQueue m_queue = VK_NULL_HANDLE;
     VkCommandPool m_commandPool = VK_NULL_HANDLE;
     uint32_t m_hostMemoryType = 0;
+    bool m_cpuDevice = false;
 };
 
 #endif
 
 // Compiles `shader` (which declares ksg_test_result as kEvaluationResultDeclaration and has a
 // [numthreads(1, 1, 1)] entry point "main") and runs it once; `count` float4 values come back.
-inline Evaluation EvaluateHLSL(const std::string& shader, size_t count) {
+// The buffer holds `initial` when the shader starts, so inputs can travel in it: the device
+// compiles large constant arrays in a shader far more slowly.
+inline Evaluation EvaluateHLSL(const std::string& shader, size_t count,
+                               const std::vector<Float4>& initial = {}) {
     Evaluation evaluation;
 #ifdef TESSEL_TEST_HAVE_VULKAN
     if (!GlslangAvailable() || !VulkanCompute::Instance().Available()) return evaluation;
     evaluation.available = true;
+    evaluation.cpuDevice = VulkanCompute::Instance().CpuDevice();
     std::vector<uint32_t> spirv;
     const CompileResult compiled = CompileHLSLToSPIRV(shader, spirv);
     if (!compiled.ok) {
@@ -307,10 +323,11 @@ inline Evaluation EvaluateHLSL(const std::string& shader, size_t count) {
         return evaluation;
     }
     evaluation.ok =
-        VulkanCompute::Instance().Run(spirv, count, evaluation.values, evaluation.error);
+        VulkanCompute::Instance().Run(spirv, count, initial, evaluation.values, evaluation.error);
 #else
     (void)shader;
     (void)count;
+    (void)initial;
 #endif
     return evaluation;
 }

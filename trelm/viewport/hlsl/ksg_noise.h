@@ -112,8 +112,6 @@ float3 hashnoise_3_4(float4 p) { return ksg_hash_vector(ksg_hash_keys_of(p), 4);
 
 // ---- Perlin (gradient) noise, signed, range about [-1,1] ----
 
-// The gradient selector of a lattice point. A float result uses the whole hash; channel c of a
-// vector result uses byte c of it.
 // A periodic noise wraps each lattice coordinate into [0, period); a period of 0 leaves the
 // coordinate as it is.
 int4 ksg_wrap_cell(int4 cell, int4 period) {
@@ -123,150 +121,121 @@ int4 ksg_wrap_cell(int4 cell, int4 period) {
     return (period > 0) ? r : cell;
 }
 
-int ksg_lattice_hash(int4 cell, int n, int channel, int4 period) {
-    uint h = ksg_hash_keys(asuint(ksg_wrap_cell(cell, period)), n);
-    if (channel < 0)
-        return (int)h;
-    return (int)((h >> (8u * (uint)channel)) & 0xFFu);
-}
-
 float ksg_negate_if(float v, int condition) { return condition != 0 ? -v : v; }
 
-float ksg_grad(int hash, float x) {
-    int h = hash & 15;
-    float g = 1.0 + (float)(h & 7);
-    if ((h & 8) != 0)
-        g = -g;
-    return g * x;
-}
-
-float ksg_grad(int hash, float x, float y) {
-    int h = hash & 7;
-    float u = h < 4 ? x : y;
-    float v = 2.0 * (h < 4 ? y : x);
-    return ksg_negate_if(u, h & 1) + ksg_negate_if(v, h & 2);
-}
-
-float ksg_grad(int hash, float x, float y, float z) {
-    int h = hash & 15;
-    float u = h < 8 ? x : y;
-    float v = h < 4 ? y : ((h == 12 || h == 14) ? x : z);
-    return ksg_negate_if(u, h & 1) + ksg_negate_if(v, h & 2);
-}
-
-float ksg_grad(int hash, float x, float y, float z, float w) {
-    int h = hash & 31;
-    float u = h < 24 ? x : y;
-    float v = h < 16 ? y : z;
-    float s = h < 8 ? z : w;
+// The gradient of a lattice corner dotted with the offset d from it, in n dimensions. A float
+// result uses the whole corner hash; channel c of a vector result uses byte c of it.
+float ksg_grad(uint hash, float4 d, int n) {
+    if (n == 1) {
+        int h = (int)(hash & 15u);
+        float g = 1.0 + (float)(h & 7);
+        return ((h & 8) != 0 ? -g : g) * d.x;
+    }
+    if (n == 2) {
+        int h = (int)(hash & 7u);
+        float u = h < 4 ? d.x : d.y;
+        float v = 2.0 * (h < 4 ? d.y : d.x);
+        return ksg_negate_if(u, h & 1) + ksg_negate_if(v, h & 2);
+    }
+    if (n == 3) {
+        int h = (int)(hash & 15u);
+        float u = h < 8 ? d.x : d.y;
+        float v = h < 4 ? d.y : ((h == 12 || h == 14) ? d.x : d.z);
+        return ksg_negate_if(u, h & 1) + ksg_negate_if(v, h & 2);
+    }
+    int h = (int)(hash & 31u);
+    float u = h < 24 ? d.x : d.y;
+    float v = h < 16 ? d.y : d.z;
+    float s = h < 8 ? d.z : d.w;
     return ksg_negate_if(u, h & 1) + ksg_negate_if(v, h & 2) + ksg_negate_if(s, h & 4);
 }
 
 float ksg_fade(float t) { return t * t * t * (t * (t * 6.0 - 15.0) + 10.0); }
 
-float ksg_lerp(float a, float b, float t) { return (1.0 - t) * a + t * b; }
+// Written out rather than lerp(), whose rounding the device chooses.
+float ksg_blend(float a, float b, float t) { return a * (1.0 - t) + b * t; }
 
-float ksg_bilerp(float v0, float v1, float v2, float v3, float s, float t) {
-    return ksg_lerp(ksg_lerp(v0, v1, s), ksg_lerp(v2, v3, s), t);
-}
+// The corners of the cell around p and their hashes, hashed once for all channels.
+struct ksg_PerlinCell {
+    float4 frac;
+    float4 weight;
+    uint hash[16];
+};
 
-float ksg_perlin1(float x, int channel, int4 period) {
-    int X = (int)floor(x);
-    float fx = x - (float)X;
-    float g0 = ksg_grad(ksg_lattice_hash(int4(X, 0, 0, 0), 1, channel, period), fx);
-    float g1 = ksg_grad(ksg_lattice_hash(int4(X + 1, 0, 0, 0), 1, channel, period), fx - 1.0);
-    return 0.25 * ksg_lerp(g0, g1, ksg_fade(fx));
-}
-
-float ksg_perlin2(float2 p, int channel, int4 period) {
-    int2 c = (int2)floor(p);
-    float2 f = p - (float2)c;
-    float v[4];
-    [unroll] for (int i = 0; i < 4; ++i) {
-        int2 o = int2(i & 1, i >> 1);
-        v[i] = ksg_grad(ksg_lattice_hash(int4(c + o, 0, 0), 2, channel, period), f.x - o.x, f.y - o.y);
-    }
-    return 0.6616 * ksg_bilerp(v[0], v[1], v[2], v[3], ksg_fade(f.x), ksg_fade(f.y));
-}
-
-// Trilinear blend of the gradients at the 8 corners of the cell of p (in the cube slice w).
-float ksg_perlin_cube(int4 c, float4 f, int n, int channel, int4 period) {
-    float v[8];
-    [unroll] for (int i = 0; i < 8; ++i) {
-        int3 o = int3(i & 1, (i >> 1) & 1, i >> 2);
-        int4 corner = int4(c.xyz + o, c.w);
-        float3 d = f.xyz - (float3)o;
-        int h = ksg_lattice_hash(corner, n, channel, period);
-        v[i] = n == 3 ? ksg_grad(h, d.x, d.y, d.z) : ksg_grad(h, d.x, d.y, d.z, f.w);
-    }
-    float s = ksg_fade(f.x), t = ksg_fade(f.y), r = ksg_fade(f.z);
-    return ksg_lerp(ksg_bilerp(v[0], v[1], v[2], v[3], s, t),
-                    ksg_bilerp(v[4], v[5], v[6], v[7], s, t), r);
-}
-
-float ksg_perlin3(float3 p, int channel, int4 period) {
-    int4 c = int4((int3)floor(p), 0);
-    float4 f = float4(p - (float3)c.xyz, 0.0);
-    return 0.9820 * ksg_perlin_cube(c, f, 3, channel, period);
-}
-
-float ksg_perlin4(float4 p, int channel, int4 period) {
+ksg_PerlinCell ksg_perlin_cell(float4 p, int n, int4 period) {
+    ksg_PerlinCell cell;
     int4 c = (int4)floor(p);
-    float4 f = p - (float4)c;
-    float near = ksg_perlin_cube(c, f, 4, channel, period);
-    float far = ksg_perlin_cube(c + int4(0, 0, 0, 1), f - float4(0, 0, 0, 1), 4, channel, period);
-    return 0.8344 * ksg_lerp(near, far, ksg_fade(f.w));
+    cell.frac = p - (float4)c;
+    cell.weight = float4(ksg_fade(cell.frac.x), ksg_fade(cell.frac.y), ksg_fade(cell.frac.z),
+                         ksg_fade(cell.frac.w));
+    [unroll] for (int i = 0; i < 16; ++i) {
+        int4 corner = ksg_wrap_cell(c + int4(i & 1, (i >> 1) & 1, (i >> 2) & 1, i >> 3), period);
+        cell.hash[i] = i < (1 << n) ? ksg_hash_keys(asuint(corner), n) : 0u;
+    }
+    return cell;
+}
+
+// One channel (-1: the float result) of the noise of a cell. The corners are blended one axis
+// at a time in the CPU shading system's order (z, x, y, then w from three dimensions up) so
+// that the sums round alike.
+float ksg_perlin_channel(ksg_PerlinCell cell, int n, int channel) {
+    float v[16];
+    [unroll] for (int i = 0; i < 16; ++i) {
+        uint h = channel < 0 ? cell.hash[i] : (cell.hash[i] >> (8u * (uint)channel)) & 0xFFu;
+        float4 offset = cell.frac - float4(i & 1, (i >> 1) & 1, (i >> 2) & 1, i >> 3);
+        v[i] = i < (1 << n) ? ksg_grad(h, offset, n) : 0.0;
+    }
+    static const int order[4][4] = {{0, 0, 0, 0}, {0, 1, 0, 0}, {2, 0, 1, 0}, {2, 0, 1, 3}};
+    int reduced = 0;
+    [unroll] for (int k = 0; k < 4; ++k) {
+        if (k < n) {
+            int axis = order[n - 1][k];
+            int bit = 1 << axis;
+            [unroll] for (int i = 0; i < 16; ++i)
+                if ((i & (reduced | bit)) == 0)
+                    v[i] = ksg_blend(v[i], v[i | bit], cell.weight[axis]);
+            reduced |= bit;
+        }
+    }
+    static const float scale[4] = {0.2500, 0.6616, 0.9820, 0.8344};
+    return scale[n - 1] * v[0];
+}
+
+float ksg_perlin(float4 p, int n, int4 period) {
+    return ksg_perlin_channel(ksg_perlin_cell(p, n, period), n, -1);
+}
+
+float3 ksg_perlin3(float4 p, int n, int4 period) {
+    ksg_PerlinCell cell = ksg_perlin_cell(p, n, period);
+    return float3(ksg_perlin_channel(cell, n, 0), ksg_perlin_channel(cell, n, 1),
+                  ksg_perlin_channel(cell, n, 2));
 }
 
 // Aperiodic noise wraps nothing.
 static const int4 ksg_no_period = int4(0, 0, 0, 0);
 
-float perlin_1_1(float1 p) { return ksg_perlin1(p.x, -1, ksg_no_period); }
-float perlin_1_2(float2 p) { return ksg_perlin2(p, -1, ksg_no_period); }
-float perlin_1_3(float3 p) { return ksg_perlin3(p, -1, ksg_no_period); }
-float perlin_1_4(float4 p) { return ksg_perlin4(p, -1, ksg_no_period); }
-float3 perlin_3_1(float1 p) {
-    return float3(ksg_perlin1(p.x, 0, ksg_no_period), ksg_perlin1(p.x, 1, ksg_no_period),
-                  ksg_perlin1(p.x, 2, ksg_no_period));
-}
-float3 perlin_3_2(float2 p) {
-    return float3(ksg_perlin2(p, 0, ksg_no_period), ksg_perlin2(p, 1, ksg_no_period),
-                  ksg_perlin2(p, 2, ksg_no_period));
-}
-float3 perlin_3_3(float3 p) {
-    return float3(ksg_perlin3(p, 0, ksg_no_period), ksg_perlin3(p, 1, ksg_no_period),
-                  ksg_perlin3(p, 2, ksg_no_period));
-}
-float3 perlin_3_4(float4 p) {
-    return float3(ksg_perlin4(p, 0, ksg_no_period), ksg_perlin4(p, 1, ksg_no_period),
-                  ksg_perlin4(p, 2, ksg_no_period));
-}
+float perlin_1_1(float1 p) { return ksg_perlin(float4(p.x, 0, 0, 0), 1, ksg_no_period); }
+float perlin_1_2(float2 p) { return ksg_perlin(float4(p, 0, 0), 2, ksg_no_period); }
+float perlin_1_3(float3 p) { return ksg_perlin(float4(p, 0), 3, ksg_no_period); }
+float perlin_1_4(float4 p) { return ksg_perlin(p, 4, ksg_no_period); }
+float3 perlin_3_1(float1 p) { return ksg_perlin3(float4(p.x, 0, 0, 0), 1, ksg_no_period); }
+float3 perlin_3_2(float2 p) { return ksg_perlin3(float4(p, 0, 0), 2, ksg_no_period); }
+float3 perlin_3_3(float3 p) { return ksg_perlin3(float4(p, 0), 3, ksg_no_period); }
+float3 perlin_3_4(float4 p) { return ksg_perlin3(p, 4, ksg_no_period); }
 
 // ---- Periodic noise (pnoise, psnoise): name_D_N(position, period) ----
 
 // Integer periods, as the CPU shading system takes them: floored, at least 1.
 int4 ksg_period(float4 period) { return max((int4)floor(period), 1); }
 
-float pperlin_1_1(float1 p, float1 t) { return ksg_perlin1(p.x, -1, ksg_period(float4(t.x, 0, 0, 0))); }
-float pperlin_1_2(float2 p, float2 t) { return ksg_perlin2(p, -1, ksg_period(float4(t, 0, 0))); }
-float pperlin_1_3(float3 p, float3 t) { return ksg_perlin3(p, -1, ksg_period(float4(t, 0))); }
-float pperlin_1_4(float4 p, float4 t) { return ksg_perlin4(p, -1, ksg_period(t)); }
-float3 pperlin_3_1(float1 p, float1 t) {
-    int4 w = ksg_period(float4(t.x, 0, 0, 0));
-    return float3(ksg_perlin1(p.x, 0, w), ksg_perlin1(p.x, 1, w), ksg_perlin1(p.x, 2, w));
-}
-float3 pperlin_3_2(float2 p, float2 t) {
-    int4 w = ksg_period(float4(t, 0, 0));
-    return float3(ksg_perlin2(p, 0, w), ksg_perlin2(p, 1, w), ksg_perlin2(p, 2, w));
-}
-float3 pperlin_3_3(float3 p, float3 t) {
-    int4 w = ksg_period(float4(t, 0));
-    return float3(ksg_perlin3(p, 0, w), ksg_perlin3(p, 1, w), ksg_perlin3(p, 2, w));
-}
-float3 pperlin_3_4(float4 p, float4 t) {
-    int4 w = ksg_period(t);
-    return float3(ksg_perlin4(p, 0, w), ksg_perlin4(p, 1, w), ksg_perlin4(p, 2, w));
-}
+float pperlin_1_1(float1 p, float1 t) { return ksg_perlin(float4(p.x, 0, 0, 0), 1, ksg_period(float4(t.x, 1, 1, 1))); }
+float pperlin_1_2(float2 p, float2 t) { return ksg_perlin(float4(p, 0, 0), 2, ksg_period(float4(t, 1, 1))); }
+float pperlin_1_3(float3 p, float3 t) { return ksg_perlin(float4(p, 0), 3, ksg_period(float4(t, 1))); }
+float pperlin_1_4(float4 p, float4 t) { return ksg_perlin(p, 4, ksg_period(t)); }
+float3 pperlin_3_1(float1 p, float1 t) { return ksg_perlin3(float4(p.x, 0, 0, 0), 1, ksg_period(float4(t.x, 1, 1, 1))); }
+float3 pperlin_3_2(float2 p, float2 t) { return ksg_perlin3(float4(p, 0, 0), 2, ksg_period(float4(t, 1, 1))); }
+float3 pperlin_3_3(float3 p, float3 t) { return ksg_perlin3(float4(p, 0), 3, ksg_period(float4(t, 1))); }
+float3 pperlin_3_4(float4 p, float4 t) { return ksg_perlin3(p, 4, ksg_period(t)); }
 
 // Periodic cell and hash noise wrap the coordinates themselves into [0, period).
 float4 ksg_wrap_coord(float4 p, float4 period) {
@@ -331,43 +300,65 @@ float ksg_simplex_grad1(int i, int seed) {
 
 float ksg_simplex1(float x, int seed) {
     int i0 = (int)floor(x);
-    float x0 = x - (float)i0;
-    float x1 = x0 - 1.0;
-    float t0 = 1.0 - x0 * x0;
-    float t1 = 1.0 - x1 * x1;
+    precise float x0 = x - (float)i0;
+    precise float x1 = x0 - 1.0;
+    precise float t0 = 1.0 - x0 * x0;
+    precise float t1 = 1.0 - x1 * x1;
     t0 *= t0;
     t1 *= t1;
-    float n0 = t0 * t0 * ksg_simplex_grad1(i0, seed) * x0;
-    float n1 = t1 * t1 * ksg_simplex_grad1(i0 + 1, seed) * x1;
-    return 0.36 * (n0 + n1);
+    precise float n0 = t0 * t0 * ksg_simplex_grad1(i0, seed) * x0;
+    precise float n1 = t1 * t1 * ksg_simplex_grad1(i0 + 1, seed) * x1;
+    precise float n = 0.36 * (n0 + n1);
+    return n;
 }
 
-// The contribution of one simplex corner at offset d with gradient g.
-float ksg_simplex_corner(float t, float gd) {
+// The contribution of one simplex corner at offset d with gradient g: (0.5 - |d|^2)^4 (g . d)
+// where positive. The squares are subtracted and the products added one at a time, in the CPU
+// shading system's order, rather than through dot(), whose rounding the device chooses.
+float ksg_simplex_corner(float2 g, float2 d) {
+    precise float t = (0.5 - d.x * d.x) - d.y * d.y;
     if (t < 0.0)
         return 0.0;
     t *= t;
-    return t * t * gd;
+    precise float n = t * t * (g.x * d.x + g.y * d.y);
+    return n;
+}
+
+float ksg_simplex_corner(float3 g, float3 d) {
+    precise float t = ((0.5 - d.x * d.x) - d.y * d.y) - d.z * d.z;
+    if (t < 0.0)
+        return 0.0;
+    t *= t;
+    precise float n = t * t * ((g.x * d.x + g.y * d.y) + g.z * d.z);
+    return n;
+}
+
+float ksg_simplex_corner(float4 g, float4 d) {
+    precise float t = (((0.5 - d.x * d.x) - d.y * d.y) - d.z * d.z) - d.w * d.w;
+    if (t < 0.0)
+        return 0.0;
+    t *= t;
+    precise float n = t * t * (((g.x * d.x + g.y * d.y) + g.z * d.z) + g.w * d.w);
+    return n;
 }
 
 float ksg_simplex2(float2 p, int seed) {
     const float F2 = 0.366025403;
     const float G2 = 0.211324865;
-    float s = (p.x + p.y) * F2;
+    precise float s = (p.x + p.y) * F2;
     int i = (int)floor(p.x + s);
     int j = (int)floor(p.y + s);
-    float t = (float)(i + j) * G2;
-    float2 d0 = p - float2((float)i - t, (float)j - t);
+    precise float t = (float)(i + j) * G2;
+    precise float2 d0 = p - float2((float)i - t, (float)j - t);
     int2 o1 = d0.x > d0.y ? int2(1, 0) : int2(0, 1);
-    float2 d1 = d0 - (float2)o1 + G2;
-    float2 d2 = d0 - 1.0 + 2.0 * G2;
-    float n = 0.0;
+    precise float2 d1 = d0 - (float2)o1 + G2;
+    precise float2 d2 = d0 - 1.0 + 2.0 * G2;
     float2 g0 = ksg_simplex_grad2[ksg_scramble(asuint(i), asuint(j), asuint(seed)) & 7u];
-    n += ksg_simplex_corner(0.5 - dot(d0, d0), dot(g0, d0));
     float2 g1 = ksg_simplex_grad2[ksg_scramble(asuint(i + o1.x), asuint(j + o1.y), asuint(seed)) & 7u];
-    n += ksg_simplex_corner(0.5 - dot(d1, d1), dot(g1, d1));
     float2 g2 = ksg_simplex_grad2[ksg_scramble(asuint(i + 1), asuint(j + 1), asuint(seed)) & 7u];
-    n += ksg_simplex_corner(0.5 - dot(d2, d2), dot(g2, d2));
+    float n = ksg_simplex_corner(g0, d0);
+    n += ksg_simplex_corner(g1, d1);
+    n += ksg_simplex_corner(g2, d2);
     return 64.0 * n;
 }
 
@@ -379,10 +370,10 @@ float3 ksg_simplex_gradient3(int3 c, int seed) {
 float ksg_simplex3(float3 p, int seed) {
     const float F3 = 0.333333333;
     const float G3 = 0.166666667;
-    float s = (p.x + p.y + p.z) * F3;
+    precise float s = (p.x + p.y + p.z) * F3;
     int3 c = (int3)floor(p + s);
-    float t = (float)(c.x + c.y + c.z) * G3;
-    float3 d0 = p - ((float3)c - t);
+    precise float t = (float)(c.x + c.y + c.z) * G3;
+    precise float3 d0 = p - ((float3)c - t);
     // The simplex of the cell that holds p follows the order of the offset's components.
     int3 o1, o2;
     if (d0.x >= d0.y) {
@@ -402,14 +393,13 @@ float ksg_simplex3(float3 p, int seed) {
             o1 = int3(0, 1, 0); o2 = int3(1, 1, 0);
         }
     }
-    float3 d1 = d0 - (float3)o1 + G3;
-    float3 d2 = d0 - (float3)o2 + 2.0 * G3;
-    float3 d3 = d0 - 1.0 + 3.0 * G3;
-    float n = 0.0;
-    n += ksg_simplex_corner(0.5 - dot(d0, d0), dot(ksg_simplex_gradient3(c, seed), d0));
-    n += ksg_simplex_corner(0.5 - dot(d1, d1), dot(ksg_simplex_gradient3(c + o1, seed), d1));
-    n += ksg_simplex_corner(0.5 - dot(d2, d2), dot(ksg_simplex_gradient3(c + o2, seed), d2));
-    n += ksg_simplex_corner(0.5 - dot(d3, d3), dot(ksg_simplex_gradient3(c + 1, seed), d3));
+    precise float3 d1 = d0 - (float3)o1 + G3;
+    precise float3 d2 = d0 - (float3)o2 + 2.0 * G3;
+    precise float3 d3 = d0 - 1.0 + 0.5; // + 3 G3, which rounds to 0.5 in float
+    float n = ksg_simplex_corner(ksg_simplex_gradient3(c, seed), d0);
+    n += ksg_simplex_corner(ksg_simplex_gradient3(c + o1, seed), d1);
+    n += ksg_simplex_corner(ksg_simplex_gradient3(c + o2, seed), d2);
+    n += ksg_simplex_corner(ksg_simplex_gradient3(c + 1, seed), d3);
     return 68.0 * n;
 }
 
@@ -421,10 +411,10 @@ float4 ksg_simplex_gradient4(int4 c, int seed) {
 float ksg_simplex4(float4 p, int seed) {
     const float F4 = 0.309016994;
     const float G4 = 0.138196601;
-    float s = (p.x + p.y + p.z + p.w) * F4;
+    precise float s = (p.x + p.y + p.z + p.w) * F4;
     int4 c = (int4)floor(p + s);
-    float t = (float)(c.x + c.y + c.z + c.w) * G4;
-    float4 d0 = p - ((float4)c - t);
+    precise float t = (float)(c.x + c.y + c.z + c.w) * G4;
+    precise float4 d0 = p - ((float4)c - t);
     // Rank of each offset component among the four (ties go to the later component); the
     // corners of the simplex step along the components from the largest rank down.
     int4 rank = int4(0, 0, 0, 0);
@@ -437,16 +427,17 @@ float ksg_simplex4(float4 p, int seed) {
     int4 o1 = (int4)(rank >= 3);
     int4 o2 = (int4)(rank >= 2);
     int4 o3 = (int4)(rank >= 1);
-    float4 d1 = d0 - (float4)o1 + G4;
-    float4 d2 = d0 - (float4)o2 + 2.0 * G4;
-    float4 d3 = d0 - (float4)o3 + 3.0 * G4;
-    float4 d4 = d0 - 1.0 + 4.0 * G4;
-    float n = 0.0;
-    n += ksg_simplex_corner(0.5 - dot(d0, d0), dot(ksg_simplex_gradient4(c, seed), d0));
-    n += ksg_simplex_corner(0.5 - dot(d1, d1), dot(ksg_simplex_gradient4(c + o1, seed), d1));
-    n += ksg_simplex_corner(0.5 - dot(d2, d2), dot(ksg_simplex_gradient4(c + o2, seed), d2));
-    n += ksg_simplex_corner(0.5 - dot(d3, d3), dot(ksg_simplex_gradient4(c + o3, seed), d3));
-    n += ksg_simplex_corner(0.5 - dot(d4, d4), dot(ksg_simplex_gradient4(c + 1, seed), d4));
+    precise float4 d1 = d0 - (float4)o1 + G4;
+    precise float4 d2 = d0 - (float4)o2 + 2.0 * G4;
+    // 3 G4 rounded in float, as the CPU computes it (a compiler folding 3.0 * G4 in double
+    // would round it one step higher).
+    precise float4 d3 = d0 - (float4)o3 + asfloat(0x3ed4451eu);
+    precise float4 d4 = d0 - 1.0 + 4.0 * G4;
+    float n = ksg_simplex_corner(ksg_simplex_gradient4(c, seed), d0);
+    n += ksg_simplex_corner(ksg_simplex_gradient4(c + o1, seed), d1);
+    n += ksg_simplex_corner(ksg_simplex_gradient4(c + o2, seed), d2);
+    n += ksg_simplex_corner(ksg_simplex_gradient4(c + o3, seed), d3);
+    n += ksg_simplex_corner(ksg_simplex_gradient4(c + 1, seed), d4);
     return 54.0 * n;
 }
 

@@ -1,27 +1,40 @@
 // Viewport versions of OSL's error function, expm1, spectral colours and colour-space
 // conversions; they follow the CPU shading system's formulas and constants.
 
-// Abramowitz and Stegun 7.1.28; absolute error below 3e-7.
+// x with the sign of s.
+float ksg_copysign(float x, float s) {
+    return asfloat((asuint(x) & 0x7fffffffu) | (asuint(s) & 0x80000000u));
+}
+
+// Abramowitz and Stegun 7.1.28, evaluated as the CPU shading system does; absolute error
+// below 2e-6.
 float fast_erf(float x) {
     const float a1 = 0.0705230784, a2 = 0.0422820123, a3 = 0.0092705272;
     const float a4 = 0.0001520143, a5 = 0.0002765672, a6 = 0.0000430638;
-    float a = abs(x);
-    float r = ((((((a6 * a + a5) * a + a4) * a + a3) * a + a2) * a + a1) * a + 1.0);
-    float r2 = r * r;
-    float r4 = r2 * r2;
-    float r8 = r4 * r4;
-    float r16 = r8 * r8;
-    float e = 1.0 - 1.0 / r16;
-    return x < 0.0 ? -e : e;
+    precise float a = 1.0 - (1.0 - abs(x)); // flushes denormals, as on the CPU
+    precise float r = ((((((a6 * a + a5) * a + a4) * a + a3) * a + a2) * a + a1) * a + 1.0);
+    precise float r2 = r * r;
+    precise float r4 = r2 * r2;
+    precise float r8 = r4 * r4;
+    precise float r16 = r8 * r8;
+    precise float e = 1.0 - 1.0 / r16;
+    return ksg_copysign(e, x);
 }
 
 float3 fast_erf(float3 x) { return float3(fast_erf(x.x), fast_erf(x.y), fast_erf(x.z)); }
 
-// exp(x) - 1, with its Taylor start near 0 where the difference would cancel.
+float ksg_fast_exp(float x) { return ksg_fast_exp2(x * 1.44269504088896341); }
+
+// exp(x) - 1 through the fast exp, with its Taylor start near 0 where the difference would
+// cancel.
 float fast_expm1(float x) {
-    if (abs(x) < 1e-5)
-        return x + 0.5 * x * x;
-    return exp(x) - 1.0;
+    if (abs(x) < 0.03) {
+        precise float y = 1.0 - (1.0 - x);
+        precise float r = 0.5 * (y * y) + y;
+        return ksg_copysign(r, x);
+    }
+    precise float r = ksg_fast_exp(x) - 1.0;
+    return r;
 }
 
 float3 fast_expm1(float3 x) {
@@ -58,44 +71,86 @@ static const float3 ksg_cie_cmf[81] = {
     float3(0.0002, 0.0001, 0.0000), float3(0.0002, 0.0001, 0.0000), float3(0.0001, 0.0000, 0.0000),
     float3(0.0001, 0.0000, 0.0000), float3(0.0001, 0.0000, 0.0000), float3(0.0000, 0.0000, 0.0000)};
 
-// Linear Rec.709 primaries with a D65 white (the shading system's default colour system).
+// Linear Rec.709 primaries with a D65 white (the shading system's default colour system): the
+// float matrices the CPU derives from the chromaticities, summed in its order.
 float3 XYZ_to_rgb(float3 c) {
-    return float3(3.2429790 * c.x - 1.5383362 * c.y - 0.4989198 * c.z,
-                  -0.9689980 * c.x + 1.8754920 * c.y + 0.0415445 * c.z,
-                  0.0556683 * c.x - 0.2041172 * c.y + 1.0576982 * c.z);
+    precise float3 rgb = c.x * float3(3.24297929, -0.968997717, 0.0556683466) +
+                         c.y * float3(-1.5383364, 1.87549162, -0.204117149) +
+                         c.z * float3(-0.498919934, 0.041544538, 1.05769825);
+    return rgb;
 }
 
 float3 rgb_to_XYZ(float3 c) {
-    return float3(0.4121353 * c.x + 0.3576750 * c.y + 0.1803568 * c.z,
-                  0.2125073 * c.x + 0.7153500 * c.y + 0.0721427 * c.z,
-                  0.0193188 * c.x + 0.1192250 * c.y + 0.9498791 * c.z);
+    precise float3 xyz = c.x * float3(0.412135273, 0.212507233, 0.0193188228) +
+                         c.y * float3(0.357675076, 0.715350151, 0.119224966) +
+                         c.z * float3(0.180356786, 0.0721427053, 0.94987905);
+    return xyz;
 }
 
 // The colour of one wavelength in nanometres, scaled so that no component exceeds 1.
 float3 wavelength_color(float lambda_nm) {
-    float position = (lambda_nm - 380.0) / 5.0;
+    precise float position = (lambda_nm - 380.0) / 5.0;
     int i = (int)position;
     // Truncation toward zero, as on the CPU: just below 380 nm extrapolates the first step.
     if (i < 0 || i >= 80)
         return float3(0.0, 0.0, 0.0);
-    float3 xyz = lerp(ksg_cie_cmf[i], ksg_cie_cmf[i + 1], position - (float)i);
+    precise float f = position - (float)i;
+    precise float3 xyz = ksg_cie_cmf[i] * (1.0 - f) + ksg_cie_cmf[i + 1] * f;
     return max(XYZ_to_rgb(xyz) * (1.0 / 2.52), 0.0);
 }
 
-// The colour of a black body at temperature T in Kelvin: Planck's law integrated against the
-// colour matching functions.
+// Spectral exitance of a black body (Planck's law), wavelength in nm, per metre of wavelength.
+float ksg_planck(float nm, float kelvin) {
+    precise float m = nm * 1e-9;
+    precise float m2 = m * m;
+    precise float m5 = m2 * m2 * m;
+    precise float e = (3.74183e-16 * (1.0 / m5)) / fast_expm1(1.4388e-2 / (m * kelvin));
+    return e;
+}
+
+// Planck's law integrated against the colour matching functions in 5 nm steps.
+float3 ksg_blackbody_xyz(float kelvin) {
+    precise float3 xyz = float3(0.0, 0.0, 0.0);
+    [loop] for (int i = 0; i < 81; ++i) {
+        precise float e = ksg_planck(380.0 + 5.0 * (float)i, kelvin) * 5e-9;
+        xyz += e * ksg_cie_cmf[i];
+    }
+    return xyz;
+}
+
+// The CPU shading system interpolates blackbody colours between 317 temperatures from 800K to
+// 12000K (T = 2 i^1.5 + 800) in their fifth roots. The viewport integrates the two it needs.
+float3 ksg_blackbody_root(float i) {
+    precise float r = sqrt(i);
+    precise float kelvin = r * r * r * 2.0 + 800.0;
+    return pow(max(XYZ_to_rgb(ksg_blackbody_xyz(kelvin)), 0.0), 0.2);
+}
+
+// The CPU shading system's cube root: a bit-level guess and two Newton steps.
+float ksg_fast_cbrt(float x) {
+    float x0 = abs(x);
+    precise float a = asfloat(0x2a5137a0 + asint(x0) / 3);
+    a = 0.333333333 * (2.0 * a + x0 / (a * a));
+    a = 0.333333333 * (2.0 * a + x0 / (a * a));
+    return ksg_copysign(x0 == 0.0 ? 0.0 : a, x);
+}
+
+// The colour of a black body at temperature T in Kelvin.
 float3 blackbody_rgb(float T) {
     if (T < 800.0)
         return float3(1.0e-6, 0.0, 0.0);
-    float3 xyz = float3(0.0, 0.0, 0.0);
-    [loop] for (int i = 0; i < 81; ++i) {
-        float lambda = 380.0 + 5.0 * (float)i;
-        // c1 / lambda^5 / (exp(c2 / (lambda T)) - 1) with lambda in nm, times a 5 nm step.
-        float l2 = lambda * lambda;
-        float emittance = 3.74183e29 / (l2 * l2 * lambda) / fast_expm1(1.4388e7 / (lambda * T));
-        xyz += (emittance * 5.0e-9) * ksg_cie_cmf[i];
+    if (T < 12000.0) {
+        precise float c = ksg_fast_cbrt((T - 800.0) / 2.0);
+        precise float t = c * c;
+        int i = min((int)t, 315);
+        precise float f = t - (float)i;
+        precise float3 root = ksg_blackbody_root((float)i) * (1.0 - f) +
+                              ksg_blackbody_root((float)(i + 1)) * f;
+        precise float3 r2 = root * root;
+        precise float3 rgb = r2 * r2 * root;
+        return rgb;
     }
-    return max(XYZ_to_rgb(xyz), 0.0);
+    return max(XYZ_to_rgb(ksg_blackbody_xyz(T)), 0.0);
 }
 
 float3 hsv_to_rgb(float3 hsv) {
@@ -128,13 +183,15 @@ float3 rgb_to_hsv(float3 rgb) {
     float s = hi > 0.0 ? chroma / hi : 0.0;
     float h = 0.0;
     if (s > 0.0) {
+        // The sector's offset and the 1/6 scale folded into one division, as on the CPU.
+        precise float turn;
         if (rgb.x >= hi)
-            h = (rgb.y - rgb.z) / chroma;
+            turn = (rgb.y - rgb.z) / (6.0 * chroma);
         else if (rgb.y >= hi)
-            h = 2.0 + (rgb.z - rgb.x) / chroma;
+            turn = 2.0 / 6.0 + (rgb.z - rgb.x) / (6.0 * chroma);
         else
-            h = 4.0 + (rgb.x - rgb.y) / chroma;
-        h *= 1.0 / 6.0;
+            turn = 4.0 / 6.0 + (rgb.x - rgb.y) / (6.0 * chroma);
+        h = turn;
         if (h < 0.0)
             h += 1.0;
     }
@@ -162,13 +219,15 @@ float3 rgb_to_hsl(float3 rgb) {
 }
 
 float3 YIQ_to_rgb(float3 yiq) {
-    return mul(yiq, float3x3(1.0000, 1.0000, 1.0000,
-                             0.9557, -0.2716, -1.1082,
-                             0.6199, -0.6469, 1.7051));
+    precise float3 rgb = yiq.x * float3(1.0000, 1.0000, 1.0000) +
+                         yiq.y * float3(0.9557, -0.2716, -1.1082) +
+                         yiq.z * float3(0.6199, -0.6469, 1.7051);
+    return rgb;
 }
 
 float3 rgb_to_YIQ(float3 rgb) {
-    return mul(rgb, float3x3(0.299, 0.596, 0.212,
-                             0.587, -0.275, -0.523,
-                             0.114, -0.321, 0.311));
+    precise float3 yiq = rgb.x * float3(0.299, 0.596, 0.212) +
+                         rgb.y * float3(0.587, -0.275, -0.523) +
+                         rgb.z * float3(0.114, -0.321, 0.311);
+    return yiq;
 }
