@@ -147,6 +147,7 @@ struct LayerAnalysis {
     std::vector<uint8_t> guarded;  // runs only under a condition, in a loop or after a return
     std::vector<int> writes;       // per program symbol: executed writes
     std::vector<int> firstReadSeq; // per program symbol: earliest executed read
+    std::vector<int> lastWriteSeq; // per program symbol: latest executed write
 };
 
 class LayerOptimizer {
@@ -161,6 +162,10 @@ public:
     void analyse();
     void markConstantParams();
     void fold();
+    void propagateCopies(const std::vector<uint32_t>& writtenGlobals);
+    bool unchangedUntilRead(int k, int ts, int xs) const;
+    bool readsFollowInRegion(int k, int ts) const;
+    void fuseAssignments(const std::vector<uint8_t>& jumpTarget);
     void removeDeadOps();
     void warn() const;
 
@@ -179,6 +184,15 @@ private:
         return ms && (ms->symtype == SymTypeLocal || ms->symtype == SymTypeTemp);
     }
     bool renderOutput(int progSym) const;
+    Operand& operand(const Instr& in, int a) {
+        return m_prog.operands[size_t(in.args - m_prog.operands.data()) + size_t(a)];
+    }
+    void reselect(Instr& in) {
+        const Instr before = in;
+        std::string why;
+        if (!selectKernel(m_sys, m_prog, in, masterOp(int(&in - m_prog.instrs.data())).opname, why))
+            in = before;
+    }
     bool indexInRange(const Instr& in, std::string_view op) const;
     bool evaluate(Instr& in);
 
@@ -235,6 +249,7 @@ void LayerOptimizer::analyse() {
     }
     m_a.writes.assign(m_prog.symbols.size(), 0);
     m_a.firstReadSeq.assign(m_prog.symbols.size(), 1 << 30);
+    m_a.lastWriteSeq.assign(m_prog.symbols.size(), -1);
     for (int k : m_a.order) {
         const Instr& in = m_prog.instrs[size_t(k)];
         const MasterOp& op = masterOp(k);
@@ -242,7 +257,11 @@ void LayerOptimizer::analyse() {
         for (int a = 0; a < in.nargs; ++a) {
             const int s = in.args[a].symbol;
             if (s < 0) continue;
-            if (w & (1u << a)) ++m_a.writes[size_t(s)];
+            if (w & (1u << a)) {
+                ++m_a.writes[size_t(s)];
+                m_a.lastWriteSeq[size_t(s)] =
+                    std::max(m_a.lastWriteSeq[size_t(s)], m_a.seq[size_t(k)]);
+            }
             if (r & (1u << a))
                 m_a.firstReadSeq[size_t(s)] =
                     std::min(m_a.firstReadSeq[size_t(s)], m_a.seq[size_t(k)]);
@@ -363,6 +382,162 @@ void LayerOptimizer::fold() {
         m_constant[size_t(s)] = 1;
         m_removed[size_t(k)] = 1;
         ++m_stats.folded;
+    }
+}
+
+bool sameStorageKind(const Operand& a, const Operand& b) {
+    return a.type == b.type && a.size == b.size && a.derivs == b.derivs &&
+           a.isClosure == b.isClosure;
+}
+
+// Whether X keeps the value it had at the unconditional copy `k` (into T) at every read of T.
+// Execution only moves forward past k, so a write of X matters when it comes after k and
+// before the last read of T, or later but inside a loop that also reads T.
+bool LayerOptimizer::unchangedUntilRead(int k, int ts, int xs) const {
+    std::vector<int> readers, writers;
+    int lastRead = -1;
+    for (int r : m_a.order) {
+        if (m_removed[size_t(r)] || m_a.seq[size_t(r)] <= m_a.seq[size_t(k)]) continue;
+        const Instr& in = m_prog.instrs[size_t(r)];
+        const MasterOp& op = masterOp(r);
+        const uint32_t w = writeMask(op), rd = readMask(op);
+        for (int a = 0; a < in.nargs; ++a) {
+            if ((rd & (1u << a)) && in.args[a].symbol == ts) {
+                readers.push_back(r);
+                lastRead = std::max(lastRead, m_a.seq[size_t(r)]);
+            }
+            if ((w & (1u << a)) && in.args[a].symbol == xs) writers.push_back(r);
+        }
+    }
+    for (int w : writers) {
+        if (m_a.seq[size_t(w)] <= lastRead) return false;
+        for (int l : m_a.order) {
+            const Instr& loop = m_prog.instrs[size_t(l)];
+            if (loop.flow != Flow::For && loop.flow != Flow::While && loop.flow != Flow::DoWhile)
+                continue;
+            auto inside = [&](int x) { return x > l && x < loop.jump[3]; };
+            if (!inside(w)) continue;
+            for (int r : readers)
+                if (inside(r)) return false;
+        }
+    }
+    return true;
+}
+
+// Whether every read of T comes after the copy `k` inside the innermost block holding it (a
+// branch, a loop part, a function body), so that each read is reached through the copy.
+bool LayerOptimizer::readsFollowInRegion(int k, int ts) const {
+    int end = 1 << 30;
+    if (m_a.guarded[size_t(k)])
+        for (int c : m_a.order) {
+            if (c >= k) break;
+            const Instr& in = m_prog.instrs[size_t(c)];
+            int bounds[5] = {c + 1, -1, -1, -1, -1};
+            int parts = 0;
+            if (in.flow == Flow::If)
+                bounds[1] = in.jump[0], bounds[2] = in.jump[1], parts = 2;
+            else if (in.flow == Flow::For || in.flow == Flow::While || in.flow == Flow::DoWhile)
+                for (int j = 0; j < 4; ++j) bounds[j + 1] = in.jump[j], parts = 4;
+            else if (in.flow == Flow::FunctionCall)
+                bounds[1] = in.jump[0], parts = 1;
+            for (int p = 0; p < parts; ++p)
+                if (k >= bounds[p] && k < bounds[p + 1]) end = std::min(end, bounds[p + 1]);
+        }
+    for (int r : m_a.order) {
+        if (r == k || m_removed[size_t(r)]) continue;
+        const Instr& in = m_prog.instrs[size_t(r)];
+        const uint32_t rd = readMask(masterOp(r));
+        for (int a = 0; a < in.nargs; ++a)
+            if ((rd & (1u << a)) && in.args[a].symbol == ts && (r < k || r >= end)) return false;
+    }
+    return true;
+}
+
+// `assign T X` with T written nowhere else: readers of T read X instead, when X cannot change
+// between the copy and those reads. Each read is reached through the copy, and X is not
+// written between them.
+void LayerOptimizer::propagateCopies(const std::vector<uint32_t>& writtenGlobals) {
+    for (int k : m_a.order) {
+        const Instr& in = m_prog.instrs[size_t(k)];
+        if (m_removed[size_t(k)] || in.flow != Flow::Plain || in.nargs != 2 || in.useCount ||
+            masterOp(k).opname != "assign")
+            continue;
+        const Operand& t = in.args[0];
+        const Operand& x = in.args[1];
+        const int ts = t.symbol, xs = x.symbol;
+        if (ts < 0 || xs < 0 || ts == xs || !isLocal(ts) || renderOutput(ts) ||
+            !sameStorageKind(t, x) || m_a.writes[size_t(ts)] != 1 ||
+            m_a.firstReadSeq[size_t(ts)] <= m_a.seq[size_t(k)] || !readsFollowInRegion(k, ts))
+            continue;
+        const ShaderSymbol& xsym = m_prog.symbols[size_t(xs)];
+        const MasterSymbol* xm = masterSymbol(xs);
+        if (xsym.layer != m_layer) continue;
+        if (xm && xm->symtype == SymTypeGlobal) {
+            if (std::find(writtenGlobals.begin(), writtenGlobals.end(), x.offset) !=
+                writtenGlobals.end())
+                continue;
+        } else if (m_a.lastWriteSeq[size_t(xs)] >= m_a.seq[size_t(k)] &&
+                   !unchangedUntilRead(k, ts, xs)) {
+            continue;
+        }
+        bool changed = false;
+        for (int r : m_a.order) {
+            if (r == k || m_removed[size_t(r)]) continue;
+            const Instr& reader = m_prog.instrs[size_t(r)];
+            const uint32_t w = writeMask(masterOp(r));
+            for (int a = 0; a < reader.nargs; ++a)
+                if (reader.args[a].symbol == ts && !(w & (1u << a))) {
+                    operand(reader, a) = x;
+                    changed = true;
+                }
+            if (changed) reselect(m_prog.instrs[size_t(r)]);
+            changed = false;
+        }
+        // Nobody reads T now; the copy itself goes with the unread ops.
+        m_a.firstReadSeq[size_t(ts)] = 1 << 30;
+        m_a.firstReadSeq[size_t(xs)] = std::min(m_a.firstReadSeq[size_t(xs)], m_a.seq[size_t(k)]);
+    }
+}
+
+// `op T ...; assign A T` with T read nowhere else: the op writes A itself. Only when the copy
+// directly follows the op and nothing jumps between them, and the op does not read A (its
+// kernel may read inputs after writing parts of its output).
+void LayerOptimizer::fuseAssignments(const std::vector<uint8_t>& jumpTarget) {
+    std::vector<int> reads(m_prog.symbols.size(), 0);
+    for (int k : m_a.order) {
+        if (m_removed[size_t(k)]) continue;
+        const Instr& in = m_prog.instrs[size_t(k)];
+        const uint32_t r = readMask(masterOp(k));
+        for (int a = 0; a < in.nargs; ++a)
+            if ((r & (1u << a)) && in.args[a].symbol >= 0) ++reads[size_t(in.args[a].symbol)];
+    }
+    for (int k : m_a.order) {
+        const int next = k + 1;
+        if (next >= int(m_prog.instrs.size()) || m_a.seq[size_t(next)] != m_a.seq[size_t(k)] + 1 ||
+            jumpTarget[size_t(next)] || m_removed[size_t(k)] || m_removed[size_t(next)])
+            continue;
+        Instr& in = m_prog.instrs[size_t(k)];
+        const Instr& copy = m_prog.instrs[size_t(next)];
+        if (in.flow != Flow::Plain || copy.flow != Flow::Plain || copy.nargs != 2 ||
+            copy.useCount || in.nargs < 1 || masterOp(next).opname != "assign")
+            continue;
+        const MasterOp& op = masterOp(k);
+        if (writeMask(op) != 1u || (readMask(op) & 1u)) continue;
+        const Operand& t = in.args[0];
+        const Operand& a = copy.args[0];
+        const int ts = t.symbol;
+        if (ts < 0 || copy.args[1].symbol != ts || a.symbol < 0 || a.symbol == ts || !isLocal(ts) ||
+            renderOutput(ts) || m_a.writes[size_t(ts)] != 1 || reads[size_t(ts)] != 1 ||
+            !sameStorageKind(t, a) || !sameStorageKind(t, copy.args[1]))
+            continue;
+        bool readsA = false;
+        for (int j = 1; j < in.nargs; ++j)
+            if (in.args[j].symbol == a.symbol || in.args[j].offset == a.offset) readsA = true;
+        if (readsA) continue;
+        operand(in, 0) = a;
+        reselect(in);
+        m_removed[size_t(next)] = 1;
+        --reads[size_t(ts)];
     }
 }
 
@@ -493,7 +668,31 @@ void optimizeProgram(ShadingSystemImpl& sys, const ShaderGroup& group, Program& 
         const MasterOp& op = group.layers[size_t(in.layer)].master->ops[size_t(in.masterOp)];
         if (!selectKernel(sys, prog, in, op.opname, why)) in = before;
     }
+    std::vector<uint32_t> writtenGlobals;
+    std::vector<uint8_t> jumpTarget(prog.instrs.size() + 1, 0);
+    for (size_t k = 0; k < prog.instrs.size(); ++k) {
+        const Instr& in = prog.instrs[k];
+        const MasterOp& op = group.layers[size_t(in.layer)].master->ops[size_t(in.masterOp)];
+        const uint32_t w = writeMask(op);
+        const ShaderMaster& m = *group.layers[size_t(in.layer)].master;
+        for (int a = 0; a < in.nargs; ++a) {
+            const int s = in.args[a].symbol;
+            if ((w & (1u << a)) && s >= 0 &&
+                m.symbols[size_t(prog.symbols[size_t(s)].masterSymbol)].symtype == SymTypeGlobal)
+                writtenGlobals.push_back(in.args[a].offset);
+        }
+        for (int j : in.jump)
+            if (j >= 0 && j <= int(prog.instrs.size())) jumpTarget[size_t(j)] = 1;
+    }
+    for (const ProgramLayer& pl : prog.layers) {
+        jumpTarget[size_t(pl.mainBegin)] = 1;
+        for (const auto& r : pl.initRanges) jumpTarget[size_t(r.first)] = 1;
+    }
     for (auto& lo : layers) {
+        if (sys.optCoalesceTemps) {
+            lo->propagateCopies(writtenGlobals);
+            lo->fuseAssignments(jumpTarget);
+        }
         if (sys.optElideUselessOps) lo->removeDeadOps();
         if (sys.optWarnings) lo->warn();
     }

@@ -104,7 +104,8 @@ bool ShadingSystem::attribute(string_view name, TypeDesc type, const void* val) 
             {"opt_merge_instances", &ShadingSystemImpl::optMergeInstances},
             {"opt_merge_instances_with_userdata",
              &ShadingSystemImpl::optMergeInstancesWithUserdata},
-            {"opt_warnings", &ShadingSystemImpl::optWarnings}};
+            {"opt_warnings", &ShadingSystemImpl::optWarnings},
+            {"opt_coalesce_temps", &ShadingSystemImpl::optCoalesceTemps}};
         for (const auto& e : ints)
             if (name == e.first) {
                 s.*(e.second) = v;
@@ -116,7 +117,6 @@ bool ShadingSystem::attribute(string_view name, TypeDesc type, const void* val) 
                                          "userdata_isconnected",
                                          "llvm_optimize",
                                          "llvm_debug",
-                                         "opt_coalesce_temps",
                                          "opt_peephole",
                                          "opt_elide_unconnected_outputs",
                                          "range_checking",
@@ -171,6 +171,7 @@ bool ShadingSystem::getattribute(string_view name, TypeDesc type, void* val) {
         if (name == "opt_merge_instances_with_userdata")
             return *out = s.optMergeInstancesWithUserdata, true;
         if (name == "opt_warnings") return *out = s.optWarnings, true;
+        if (name == "opt_coalesce_temps") return *out = s.optCoalesceTemps, true;
         if (name == "num_closures") return *out = int(s.closures.size()), true;
         return false;
     }

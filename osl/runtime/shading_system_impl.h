@@ -46,7 +46,7 @@ public:
     int lazyGlobals = 1, debugLayers = 0;
     // The optimiser's switches (see optimizer.h).
     int optConstantFold = 1, optElideUselessOps = 1, optMergeInstances = 1;
-    int optMergeInstancesWithUserdata = 1, optWarnings = 0;
+    int optMergeInstancesWithUserdata = 1, optWarnings = 0, optCoalesceTemps = 1;
     std::string searchpathShader;
     std::string commonspace = "common";
     std::string colorspace = "Rec709";
