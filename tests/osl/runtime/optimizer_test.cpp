@@ -128,6 +128,51 @@ code ___main___
 	end
 )";
 
+// x = u * u; t = x; x = x + 1; before = t (the copy's value, not x's); after = x.
+const char* kCopyOso = R"(OpenShadingLanguage 1.00
+# Compiled by oslc 1.12.13.0
+shader copy
+oparam	float	before	0		%read{2147483647,-1} %write{3,3}
+oparam	float	after	0		%read{2147483647,-1} %write{4,4}
+global	float	u	%read{0,0} %write{2147483647,-1}
+local	float	x	%read{1,4} %write{0,2}
+temp	float	t	%read{3,3} %write{1,1}
+const	float	$c1	1		%read{2,2} %write{2147483647,-1}
+code ___main___
+	mul		x u u 	%argrw{"wrr"}
+	assign		t x 	%argrw{"wr"}
+	add		x x $c1 	%argrw{"wrr"}
+	assign		before t 	%argrw{"wr"}
+	assign		after x 	%argrw{"wr"}
+	end
+)";
+
+// if (flag) t = u * 2; out = t; then sum = u + u and twice = u * 2, each through a temporary.
+const char* kCopyGuardedOso = R"(OpenShadingLanguage 1.00
+# Compiled by oslc 1.12.13.0
+shader copyguarded
+param	int	flag	0		%read{0,0} %write{2147483647,-1}
+oparam	float	out	0		%read{2147483647,-1} %write{3,3}
+oparam	float	sum	0		%read{2147483647,-1} %write{5,5}
+oparam	float	twice	0		%read{2147483647,-1} %write{7,7}
+global	float	u	%read{1,6} %write{2147483647,-1}
+temp	float	x	%read{2,2} %write{1,1}
+temp	float	t	%read{3,3} %write{2,2}
+temp	float	s	%read{5,5} %write{4,4}
+temp	float	r	%read{7,7} %write{6,6}
+const	float	$c2	2		%read{1,6} %write{2147483647,-1}
+code ___main___
+	if		flag 3 3 	%argrw{"r"}
+	mul		x u $c2 	%argrw{"wrr"}
+	assign		t x 	%argrw{"wr"}
+	assign		out t 	%argrw{"wr"}
+	add		s u u 	%argrw{"wrr"}
+	assign		sum s 	%argrw{"wr"}
+	mul		r u $c2 	%argrw{"wrr"}
+	assign		twice r 	%argrw{"wr"}
+	end
+)";
+
 class OptimizerTest : public ::testing::Test {
 protected:
     OptimizerTest() : ss(nullptr, nullptr, &handler) {
@@ -137,7 +182,8 @@ protected:
             {"noisy", kNoisyOso},       {"warner", kWarnOso},
             {"add", kAddOso},           {"loop", kLoopOso},
             {"derivs", kDerivsOso},     {"printer", kPrintOso},
-            {"upstream", kUpstreamOso}, {"downstream", kDownstreamOso}};
+            {"upstream", kUpstreamOso}, {"downstream", kDownstreamOso},
+            {"copy", kCopyOso},         {"copyguarded", kCopyGuardedOso}};
         for (const auto& s : shaders)
             EXPECT_TRUE(ss.LoadMemoryCompiledShader(s.first, s.second))
                 << s.first << handler.errors;
@@ -239,6 +285,22 @@ TEST_F(OptimizerTest, ReadsBeforeTheWriteKeepTheStartingValue) {
     ShaderGroupRef g = single("readfirst");
     EXPECT_FLOAT_EQ(run<float>(*g, "before"), 0.0f);
     EXPECT_FLOAT_EQ(run<float>(*g, "after"), 6.0f);
+}
+
+TEST_F(OptimizerTest, CopiesAreNotBypassedWhenTheSourceChanges) {
+    ShaderGroupRef g = single("copy");
+    EXPECT_FLOAT_EQ(run<float>(*g, "before", 0.5f), 0.25f);
+    EXPECT_FLOAT_EQ(run<float>(*g, "after", 0.5f), 1.25f);
+}
+
+TEST_F(OptimizerTest, CopiesUnderAConditionStayThere) {
+    ShaderGroupRef g = single("copyguarded");
+    EXPECT_FLOAT_EQ(run<float>(*g, "out", 0.5f), 0.0f);
+    // The add and the mul write the outputs directly: the copies of their results are gone.
+    EXPECT_FLOAT_EQ(run<float>(*g, "sum", 0.5f), 1.0f);
+    EXPECT_FLOAT_EQ(run<float>(*g, "twice", 0.5f), 1.0f);
+    ShaderGroupRef plain = single("copyguarded", 0);
+    EXPECT_LE(stat(*g, "stat:instructions"), stat(*plain, "stat:instructions") - 2);
 }
 
 TEST_F(OptimizerTest, OptionsSwitchPartsOff) {
@@ -360,7 +422,9 @@ TEST_F(OptimizerTest, SameResultsWithAndWithoutOptimisation) {
                                      {"derivs", {"d", "w", "a"}},
                                      {"printer", {"formatted"}},
                                      {"upstream", {"out", "col"}},
-                                     {"downstream", {"result"}}};
+                                     {"downstream", {"result"}},
+                                     {"copy", {"before", "after"}},
+                                     {"copyguarded", {"out", "sum", "twice"}}};
     for (const Case& c : cases) {
         ShaderGroupRef on = single(c.shader, 2);
         ShaderGroupRef off = single(c.shader, 0);
