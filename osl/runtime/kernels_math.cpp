@@ -36,14 +36,16 @@ struct Mul {
     static D2 d(const D2& a, const D2& b) { return a * b; }
     static int i(int a, int b) { return a * b; }
 };
-// Divisors too small to be normal floats count as zero, as under the flush-to-zero arithmetic
-// the reference's compiled shaders run with.
-inline bool zeroDivisor(float b) {
-    return std::fabs(b) < FLT_MIN;
-}
+// A quotient that is not a finite number (a zero divisor, or one so tiny that the quotient
+// overflows) is zero; tiny divisors with a representable quotient divide normally.
 struct Div {
-    static float v(float a, float b) { return zeroDivisor(b) ? 0.0f : a / b; }
-    static D2 d(const D2& a, const D2& b) { return zeroDivisor(b.val()) ? D2(0.0f) : a / b; }
+    static float v(float a, float b) {
+        const float q = a / b;
+        return std::isfinite(q) ? q : 0.0f;
+    }
+    static D2 d(const D2& a, const D2& b) {
+        return std::isfinite(a.val() / b.val()) ? a / b : D2(0.0f);
+    }
     static int i(int a, int b) { return b == 0 ? 0 : a / b; }
 };
 struct Mod {
@@ -488,8 +490,20 @@ void kDistance(ExecState& st, const Instr& in) {
 void kNormalize(ExecState& st, const Instr& in) {
     D2 v[3];
     for (int c = 0; c < 3; ++c) v[c] = st.dual(in.args[1], c);
+    if (v[0].val() == 0.0f && v[1].val() == 0.0f && v[2].val() == 0.0f) {
+        for (int c = 0; c < 3; ++c) st.store(in.args[0], c, D2(0.0f));
+        return;
+    }
     const D2 len = lengthOf(v);
-    for (int c = 0; c < 3; ++c) st.store(in.args[0], c, len.val() == 0.0f ? D2(0.0f) : v[c] / len);
+    // With derivatives the components are scaled by the length's reciprocal, as the reference
+    // does; its derivative rounding differs from a division's.
+    if (in.args[0].derivs) {
+        const D2 inv = D2(1.0f) / len;
+        for (int c = 0; c < 3; ++c) st.store(in.args[0], c, v[c] * inv);
+    } else {
+        for (int c = 0; c < 3; ++c)
+            st.store(in.args[0], c, len.val() == 0.0f ? D2(0.0f) : v[c] / len);
+    }
 }
 // ---- selection ------------------------------------------------------------------------------
 
