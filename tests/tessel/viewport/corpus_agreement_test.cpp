@@ -58,9 +58,13 @@ struct Output {
     int width = 1;    // 1 or 3 floats
 };
 
+// Points a comparison leaves out: where a shader uses what the viewport only approximates.
+using Exclusion = bool (*)(float u, float v);
+
 // Runs one corpus shader over a grid of (u, v) with P = (u, v, 1) and N = Ng = I = (0, 0, 1)
 // on the device and on the CPU; counts the values that differ by more than `tolerance`.
-void CheckShader(const std::string& relative, float tolerance, bool& ran) {
+void CheckShader(const std::string& relative, float tolerance, bool& ran,
+                 Exclusion excluded = nullptr) {
     SCOPED_TRACE(relative);
     const std::filesystem::path path =
         std::filesystem::path(TESSEL_SHARED_DIR) / "osl-conformance" / "testsuite" / relative;
@@ -129,11 +133,12 @@ void CheckShader(const std::string& relative, float tolerance, bool& ran) {
     ASSERT_TRUE(system.ShaderGroupEnd(*group)) << log.text;
     OSL::PerThreadInfo* thread = system.create_thread_info();
     OSL::ShadingContext* context = system.get_context(thread);
-    size_t differing = 0;
+    size_t differing = 0, compared = 0;
     float worst = 0.0f;
     std::string first;
     for (size_t i = 0; i < n; ++i) {
         const Float4& q = buffer[n * m + i];
+        if (excluded && excluded(q[0], q[1])) continue;
         OSL::ShaderGlobals globals;
         std::memset(static_cast<void*>(&globals), 0, sizeof globals);
         globals.u = q[0];
@@ -147,7 +152,7 @@ void CheckShader(const std::string& relative, float tolerance, bool& ran) {
             ASSERT_NE(symbol, nullptr) << outputs[k].name;
             const float* cpu = static_cast<const float*>(system.symbol_address(*context, symbol));
             ASSERT_NE(cpu, nullptr);
-            for (int c = 0; c < outputs[k].width; ++c) {
+            for (int c = 0; c < outputs[k].width; ++c, ++compared) {
                 const float got = gpu.values[k * n + i][c];
                 const float diff = std::fabs(got - cpu[c]);
                 worst = std::max(worst, diff);
@@ -163,7 +168,7 @@ void CheckShader(const std::string& relative, float tolerance, bool& ran) {
     system.release_context(context);
     system.destroy_thread_info(thread);
     std::printf("[ corpus ] %-45s %zu of %zu values differ by more than %g, max difference %g\n",
-                relative.c_str(), differing, n * m * 3, double(tolerance), double(worst));
+                relative.c_str(), differing, compared, double(tolerance), double(worst));
     std::fflush(stdout);
     EXPECT_EQ(differing, 0u) << "first: " << first;
 }
@@ -179,17 +184,41 @@ TEST(CorpusAgreement, SpectralAndPeriodicNoiseShadersShowTheRendersColours) {
     if (!ran) GTEST_SKIP() << "no Vulkan device to run HLSL, or no reference corpus";
 }
 
-// Known to disagree, for reasons outside the library: the generic periodic noise has rows of
-// Gabor noise, which the viewport draws as Perlin noise (the regression shaders, which also
-// carry Gabor noise, differ in one block of their grid, most likely the same cause); the hash
-// noise shader hashes coordinates computed from constants the generator writes with six
-// significant digits (0.984808 for 0.984807729721069335), so nearly every hash differs.
-TEST(CorpusAgreement, DISABLED_GaborAndHashNoiseShaders) {
+// The regression shaders draw Gabor noise in one block (u in (0.51, 0.74), v > 0.51), which the
+// viewport approximates with Perlin noise; every other block must agree.
+bool GaborBlock(float u, float v) {
+    return u > 0.51f && u < 0.74f && v > 0.51f;
+}
+
+TEST(CorpusAgreement, NoiseRegressionShadersShowTheRendersColoursOutsideGabor) {
     bool ran = false;
     for (const char* shader :
-         {"pnoise-generic/oso-ref/test.oso", "noise-reg/oso-ref/test_noise_3d_v.oso",
-          "pnoise-reg/oso-ref/test_pnoise_3d_v_v.oso", "hashnoise/oso-ref/test.oso"})
-        CheckShader(shader, kVisible, ran);
+         {"noise-reg/oso-ref/test_noise_3d_v.oso", "pnoise-reg/oso-ref/test_pnoise_3d_v_v.oso"})
+        CheckShader(shader, kVisible, ran, GaborBlock);
+    if (!ran) GTEST_SKIP() << "no Vulkan device to run HLSL, or no reference corpus";
+}
+
+// The generic periodic noise picks its noise by row, int(14 v) % 7: row 2 is Gabor noise, and
+// row 6 hash noise of coordinates that come from constants the generator writes with six
+// significant digits (see the disabled check below).
+bool GaborAndHashRows(float, float v) {
+    const int row = int(v * 14.0f) % 7;
+    return row == 2 || row == 6;
+}
+
+TEST(CorpusAgreement, GenericPeriodicNoiseShowsTheRendersColoursOutsideGaborAndHash) {
+    bool ran = false;
+    CheckShader("pnoise-generic/oso-ref/test.oso", kVisible, ran, GaborAndHashRows);
+    if (!ran) GTEST_SKIP() << "no Vulkan device to run HLSL, or no reference corpus";
+}
+
+// Known to disagree, for a reason outside the library: the hash noise shader hashes coordinates
+// computed from constants the generator writes with six significant digits (0.984808 for
+// 0.984807729721069335), so nearly every hash differs. It passes once the generator writes
+// constants that read back as the same floats.
+TEST(CorpusAgreement, DISABLED_HashNoiseShader) {
+    bool ran = false;
+    CheckShader("hashnoise/oso-ref/test.oso", kVisible, ran);
     if (!ran) GTEST_SKIP() << "no Vulkan device to run HLSL, or no reference corpus";
 }
 
