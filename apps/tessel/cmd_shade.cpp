@@ -60,8 +60,10 @@ public:
     }
 };
 
-// The renderer of the grid: "shader" and "object" space are fixed transformations, and
-// "camera" and "world" coincide with common space.
+// The renderer of the grid: "shader" and "object" space are fixed transformations and
+// "myspace" the only named one. The camera sits at the origin of common space, so transforming
+// into "camera" (or screen, NDC, raster) works while transforming out of it is unknown, as in
+// testshade.
 class GridRenderer final : public RendererServices {
 public:
     GridRenderer() {
@@ -69,8 +71,6 @@ public:
         m_shader.rotate(Vec3(0.0f, 0.0f, float(M_PI_4)));
         m_object.translate(Vec3(0.0f, 1.0f, 0.0f));
         m_object.rotate(Vec3(0.0f, 0.0f, float(M_PI_2)));
-        m_named[ustring("camera")] = Matrix44();
-        m_named[ustring("world")] = Matrix44();
         Matrix44 myspace;
         myspace.scale(Vec3(1.0f, 2.0f, 1.0f));
         m_named[ustring("myspace")] = myspace;
@@ -108,7 +108,10 @@ public:
         if (n == "camera:shutter_open") return floats({0.0f});
         if (n == "camera:shutter_close") return floats({1.0f});
         if (n == "camera:shutter") return floats({0.0f, 1.0f});
-        if (n == "camera:screen_window") return floats({-1.0f, -1.0f, 1.0f, 1.0f});
+        if (n == "camera:screen_window") {
+            const float aspect = float(m_xres) / float(m_yres);
+            return floats({-aspect, -1.0f, aspect, 1.0f});
+        }
         return false;
     }
     bool get_matrix(ShaderGlobals*, Matrix44& result, TransformationPtr xform, float) override {
@@ -127,6 +130,19 @@ public:
     }
     bool get_matrix(ShaderGlobals* sg, Matrix44& result, ustring from) override {
         return get_matrix(sg, result, from, 0.0f);
+    }
+    bool get_inverse_matrix(ShaderGlobals*, Matrix44& result, ustring to, float) override {
+        if (to == "camera" || to == "screen" || to == "NDC" || to == "raster") {
+            result = cameraToSpace(to);
+            return true;
+        }
+        auto it = m_named.find(to);
+        if (it == m_named.end()) return false;
+        result = it->second.inverse();
+        return true;
+    }
+    bool get_inverse_matrix(ShaderGlobals* sg, Matrix44& result, ustring to) override {
+        return get_inverse_matrix(sg, result, to, 0.0f);
     }
     // Geometry data of the grid: values given with --userdata, and "s" and "t" following u
     // and v.
@@ -166,6 +182,22 @@ public:
             out[2] = isS ? sg->dudy : sg->dvdy;
         }
         return true;
+    }
+    // Common (= camera) space to the camera's screen, NDC or raster space: a 90 degree
+    // perspective with clipping planes at 0.1 and 1000 and the screen spanning [-1, 1]
+    // vertically.
+    Matrix44 cameraToSpace(ustring to) const {
+        Matrix44 m; // the camera is common space itself
+        if (to == "camera") return m;
+        const float hither = 0.1f, yon = 1000.0f;
+        const float depth = yon - hither;
+        const float invTan = 1.0f / std::tan(0.5f * 90.0f * float(M_PI) / 180.0f);
+        m = m * Matrix44(invTan, 0, 0, 0, 0, invTan, 0, 0, 0, 0, yon / depth, 1, 0, 0,
+                         -yon * hither / depth, 0);
+        if (to == "screen") return m;
+        m = m * Matrix44(0.5f, 0, 0, 0, 0, 0.5f, 0, 0, 0, 0, 1, 0, 0.5f, 0.5f, 0, 1);
+        if (to == "NDC") return m;
+        return m * Matrix44(float(m_xres), 0, 0, 0, 0, float(m_yres), 0, 0, 0, 0, 1, 0, 0, 0, 0, 1);
     }
     const Matrix44* shaderMatrix() const { return &m_shader; }
     const Matrix44* objectMatrix() const { return &m_object; }

@@ -381,6 +381,11 @@ Vec3 ColorSystem::wavelengthColor(float nm) const {
     return rgb;
 }
 
+bool ColorSystem::isRgbName(ustring s) const {
+    const SpaceNames& n = names();
+    return s == n.RGB || s == n.rgb || s == n.linear || s == m_name;
+}
+
 bool ColorSystem::isBuiltin(ustring s) const {
     const SpaceNames& n = names();
     return s == n.RGB || s == n.rgb || s == n.linear || s == m_name || s == n.hsv || s == n.hsl ||

@@ -48,6 +48,8 @@ public:
     // Whether `space` is one this system converts itself (RGB, hsv, hsl, YIQ, XYZ, xyY, sRGB,
     // linear or the system's own name); other names need an external colour configuration.
     bool isBuiltin(ustring space) const;
+    // "RGB", "rgb", "linear" or this system's own name: spaces holding the colour unchanged.
+    bool isRgbName(ustring space) const;
     // Converts between two built-in spaces; false (and `out` untouched) when either is not one.
     bool transform(ustring from, ustring to, const Vec3& c, Vec3& out) const;
     bool transform(ustring from, ustring to, const DColor& c, DColor& out) const;

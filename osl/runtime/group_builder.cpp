@@ -73,8 +73,8 @@ bool addShader(ShadingSystemImpl& sys, ShaderGroup& g, string_view usage, string
     const ustring name(shadername);
     ShaderMasterRef master = sys.findMaster(name);
     if (!master) {
+        // The pending parameters stay for the next shader that loads, as in the reference.
         sys.error("Could not find shader \"" + name.string() + "\"" + groupSuffix(g));
-        g.pending.clear();
         return false;
     }
     ShaderInstance inst;
@@ -91,14 +91,22 @@ bool addShader(ShadingSystemImpl& sys, ShaderGroup& g, string_view usage, string
             continue;
         }
         const MasterSymbol& ms = master->symbols[size_t(sym)];
+        if (ms.type.is_closure_based()) {
+            sys.warning("skipping assignment of closure: " + p.name.string());
+            continue;
+        }
+        if (ms.type.is_structure_based()) continue; // its fields are parameters of their own
+        // The value's type must be the parameter's (any triple for a triple, any length for an
+        // unsized array), or one float for a triple; numbers are not converted.
         const TypeDesc st = ms.type.simpletype();
-        const bool numeric =
-            (p.type.basetype == TypeDesc::FLOAT || p.type.basetype == TypeDesc::INT) &&
-            (st.basetype == TypeDesc::FLOAT || st.basetype == TypeDesc::INT);
-        if (!numeric && p.type.basetype != st.basetype) {
-            sys.error("Parameter '" + p.name.string() + "' of shader " + name.string() +
-                      " has type " + ms.type.string() + ", cannot be set from " +
-                      std::string(p.type.c_str()));
+        const bool sameKind = st.basetype == p.type.basetype && st.aggregate == p.type.aggregate &&
+                              (st.arraylen == p.type.arraylen || st.arraylen < 0);
+        const bool floatToTriple = st.aggregate == TypeDesc::VEC3 && st.arraylen == 0 &&
+                                   p.type == TypeDesc::FLOAT;
+        if (!sameKind && !floatToTriple) {
+            sys.warning("attempting to set parameter with wrong type: " + p.name.string() +
+                        " (expected '" + std::string(st.c_str()) + "', received '" +
+                        std::string(p.type.c_str()) + "')");
             continue;
         }
         InstanceValue iv;

@@ -57,6 +57,13 @@ void kTransformc(ExecState& st, const Instr& in) {
     st.storeVec(R, out);
 }
 
+// transformc between two spellings of the same space, both fixed when the group was built:
+// the colour passes unchanged, as the reference's constant folding leaves it. (A round trip
+// through RGB could move it, e.g. a hue of 1 comes back as 0.)
+void kTransformcIdentity(ExecState& st, const Instr& in) {
+    st.storeVec(in.args[0], st.dvec(in.args[in.nargs - 1]));
+}
+
 void kLuminance(ExecState& st, const Instr& in) {
     const Operand& R = in.args[0];
     const ColorSystem& cs = systemOf(in);
@@ -74,6 +81,21 @@ void kWavelengthColor(ExecState& st, const Instr& in) {
     st.storeVec(in.args[0], systemOf(in).wavelengthColor(st.scalar(in.args[1])));
 }
 
+// Whether a transformc's spaces are constants naming the same space, counting every name of
+// the system's RGB as one.
+bool sameFixedSpaces(const KernelChoice& k, int n) {
+    const ColorSystem& cs = ColorSystem::findOrDefault(k.sys.colorspace);
+    auto fixedSpace = [&](const Operand& o, ustring& space) {
+        if (!o.isString || !o.isConst) return false;
+        space = *reinterpret_cast<const ustring*>(k.prog.initImage.data() + o.offset);
+        if (cs.isRgbName(space)) space = ustring("rgb");
+        return true;
+    };
+    ustring from("rgb"), to;
+    if (n == 4 && !fixedSpace(k.arg(1), from)) return false;
+    return fixedSpace(k.arg(n - 2), to) && from == to;
+}
+
 } // namespace
 
 int selectColorKernel(KernelChoice& k) {
@@ -83,7 +105,7 @@ int selectColorKernel(KernelChoice& k) {
     if (op == "color" && n == 5 && k.arg(1).isString)
         fn = kColorFromSpace;
     else if (op == "transformc" && (n == 3 || n == 4))
-        fn = kTransformc;
+        fn = sameFixedSpaces(k, n) ? kTransformcIdentity : kTransformc;
     else if (op == "luminance" && n == 2)
         fn = kLuminance;
     else if (op == "blackbody" && n == 2)

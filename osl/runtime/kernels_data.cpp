@@ -331,6 +331,9 @@ int selectDataKernel(KernelChoice& k) {
         return 0;
     }
     if (op == "matrix") return k.in.fn = kMatrixCtor, 1;
+    if ((op == "transform" || op == "transformv" || op == "transformn") && n == 4 &&
+        sameFixedSpace(k.prog, k.arg(1), k.arg(2)))
+        return k.in.fn = kTransformIdentity, 1;
     if (op == "transform" && (n == 3 || n == 4)) return k.in.fn = kTransform<0>, 1;
     if (op == "transformv" && (n == 3 || n == 4)) return k.in.fn = kTransform<1>, 1;
     if (op == "transformn" && (n == 3 || n == 4)) return k.in.fn = kTransform<2>, 1;

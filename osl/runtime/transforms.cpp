@@ -30,6 +30,21 @@ bool getSpaceMatrix(ExecState& st, ustring space, Matrix44& m, bool toCommon) {
     return ok;
 }
 
+bool sameFixedSpace(const Program& prog, const Operand& from, const Operand& to) {
+    auto fixed = [&](const Operand& o, ustring& space) {
+        if (!o.isString || !o.isConst) return false;
+        space = *reinterpret_cast<const ustring*>(prog.initImage.data() + o.offset);
+        if (space == "world") space = ustring("common");
+        return true;
+    };
+    ustring a, b;
+    return fixed(from, a) && fixed(to, b) && a == b;
+}
+
+void kTransformIdentity(ExecState& st, const Instr& in) {
+    st.storeVec(in.args[0], st.dvec(in.args[in.nargs - 1]));
+}
+
 Dual2<Vec3> transformDual(const Matrix44& m, const Dual2<Vec3>& v, int kind) {
     Dual2<Vec3> r;
     if (kind == 0) {

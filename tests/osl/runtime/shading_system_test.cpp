@@ -62,7 +62,7 @@ TEST_F(ShadingSystemTest, RunsWithDefaultParameterValues) {
     EXPECT_TRUE(handler.errors.empty()) << handler.errors;
 }
 
-TEST_F(ShadingSystemTest, InstanceValuesReplaceDefaultsAndConvertInts) {
+TEST_F(ShadingSystemTest, InstanceValuesReplaceDefaultsAndWrongTypesAreSkipped) {
     ShaderGroupRef g = ss.ShaderGroupBegin("");
     const float a = 5.0f;
     const int b = 4;
@@ -70,7 +70,10 @@ TEST_F(ShadingSystemTest, InstanceValuesReplaceDefaultsAndConvertInts) {
     ss.Parameter(*g, "b", TypeInt, &b);
     ASSERT_TRUE(ss.Shader(*g, "surface", "add", "l"));
     ASSERT_TRUE(ss.ShaderGroupEnd(*g));
-    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 9.0f);
+    // An int is not converted for a float parameter: b keeps its default of 2.
+    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 7.0f);
+    EXPECT_EQ(handler.warnings,
+              "attempting to set parameter with wrong type: b (expected 'float', received 'int')\n");
 }
 
 TEST_F(ShadingSystemTest, UnknownShaderIsReportedAndFails) {
