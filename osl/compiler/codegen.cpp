@@ -753,6 +753,41 @@ void CodeGen::varDecl(const Node* d) {
     }
 }
 
+// An array of numbers or strings initialised wholly from literals is one constant, copied in
+// with a single op, as oslc makes it.
+Symbol* CodeGen::constArray(const Node* init, const TypeSpec& t) {
+    TypeSpec elem = t.elementtype();
+    if (!t.is_sized_array() || int(init->kids.size()) != t.arraylength() ||
+        !(elem.is_int() || elem.is_float() || elem.is_string()))
+        return nullptr;
+    auto literal = [](const Node* k) {
+        if (k->kind == NodeKind::Unary && k->op == "-" && k->kid(0)) k = k->kid(0);
+        return k->kind == NodeKind::IntLit || k->kind == NodeKind::FloatLit ||
+               k->kind == NodeKind::StringLit;
+    };
+    for (const auto& k : init->kids)
+        if (!literal(k.get()) || (elem.is_string() != (k->kind == NodeKind::StringLit)))
+            return nullptr;
+    std::vector<int> iv;
+    std::vector<float> fv;
+    std::vector<std::string> sv;
+    for (const auto& k : init->kids) {
+        Symbol* v = expr(k.get(), &elem);
+        if (!v->isConst()) return nullptr;
+        if (elem.is_string() && !v->svals.empty())
+            sv.push_back(v->svals[0]);
+        else if (elem.is_int() && v->type.is_int() && !v->ivals.empty())
+            iv.push_back(v->ivals[0]);
+        else if (elem.is_float() && v->type.is_int() && !v->ivals.empty())
+            fv.push_back(float(v->ivals[0]));
+        else if (elem.is_float() && v->type.is_float() && !v->fvals.empty())
+            fv.push_back(v->fvals[0]);
+        else
+            return nullptr;
+    }
+    return constant(t, iv, fv, sv);
+}
+
 void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool isDecl) {
     const TypeSpec& t = var->type;
     if (init->kind == NodeKind::InitList) {
@@ -766,6 +801,10 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
                 return;
             }
             TypeSpec elem = t.elementtype();
+            if (Symbol* folded = constArray(init, t)) {
+                emit("assign", {var, folded});
+                return;
+            }
             for (size_t i = 0; i < init->kids.size(); ++i) {
                 const Node* k = init->kid(i);
                 Symbol* val = k->kind == NodeKind::InitList ? initList(k, elem) : expr(k, &elem);

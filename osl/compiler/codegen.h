@@ -91,6 +91,7 @@ private:
     void statement(const Node* s);
     void varDecl(const Node* d);
     void initVariable(Symbol* var, const Node* init, const Node* at, bool isDecl);
+    Symbol* constArray(const Node* init, const TypeSpec& t);
     void ifStatement(const Node* s);
     void loop(const Node* s);
     void returnStatement(const Node* s);

@@ -94,7 +94,11 @@ float filterwidth(float x);
 vector filterwidth(point x);
 vector filterwidth(vector x);
 #define OSL_DERIV(T) T Dx(T x); T Dy(T x); T Dz(T x);
-OSL_DERIV(float) OSL_DERIV(color) OSL_DERIV(point) OSL_DERIV(vector) OSL_DERIV(normal)
+OSL_DERIV(float) OSL_DERIV(color) OSL_DERIV(vector) OSL_DERIV(normal)
+// The change of a position is a direction.
+vector Dx(point p);
+vector Dy(point p);
+vector Dz(point p);
 
 point transform(string from, string to, point p);
 point transform(matrix m, point p);

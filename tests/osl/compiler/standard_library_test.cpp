@@ -241,3 +241,23 @@ TEST(StandardLibrary, DestinationIsNotAnArgument) {
 }
 
 } // namespace
+
+namespace {
+
+TEST(StandardLibrary, LiteralArraysAreConstants) {
+    auto c = compile("string s[3] = {\"a\", \"b\", \"c\"}; float f[2] = {1, -2.5};"
+                     " float g[2] = {u, 1}; printf(\"%s %g %g\", s[1], f[1], g[0]);");
+    ASSERT_TRUE(c->ok) << c->firstError();
+    EXPECT_NE(c->oso.find("const\tstring[3]\t"), std::string::npos) << c->oso;
+    EXPECT_NE(c->oso.find("\t1 -2.5\t"), std::string::npos) << c->oso;
+    EXPECT_EQ(count(c->ops, "aassign"), 2) << "only the array with a varying element";
+    EXPECT_EQ(count(c->ops, "assign"), 2);
+}
+
+TEST(StandardLibrary, DerivativeOfAPositionIsADirection) {
+    auto c = compile("vector d = Dx(P); point q = P + Dy(P);");
+    ASSERT_TRUE(c->ok) << c->firstError();
+    EXPECT_NE(c->oso.find("\tDx\t\td P"), std::string::npos) << c->oso;
+}
+
+} // namespace
