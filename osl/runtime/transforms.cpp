@@ -48,16 +48,20 @@ void kTransformIdentity(ExecState& st, const Instr& in) {
 Dual2<Vec3> transformDual(const Matrix44& m, const Dual2<Vec3>& v, int kind) {
     Dual2<Vec3> r;
     if (kind == 0) {
-        const Vec3& p = v.val();
-        const float w = p.x * m[0][3] + p.y * m[1][3] + p.z * m[2][3] + m[3][3];
-        Vec3 q;
-        m.multVecMatrix(p, q);
-        r.val() = q;
-        for (int d = 1; d < 3; ++d) {
-            Vec3 dv;
-            m.multDirMatrix(v.elem(d), dv);
-            r.elem(d) = w != 0.0f && w != 1.0f ? dv / w : dv;
+        // A point goes through the full projective transform; its derivatives follow the
+        // division by w, and a point sent to infinity (w == 0) comes out as the origin.
+        using D = Dual2<float>;
+        const D x(v.val().x, v.dx().x, v.dy().x), y(v.val().y, v.dx().y, v.dy().y),
+            z(v.val().z, v.dx().z, v.dy().z);
+        D out[3];
+        const D w = x * m[0][3] + y * m[1][3] + z * m[2][3] + D(m[3][3]);
+        for (int c = 0; c < 3; ++c) {
+            const D a = x * m[0][c] + y * m[1][c] + z * m[2][c] + D(m[3][c]);
+            out[c] = w.val() != 0.0f ? a / w : D(0.0f);
         }
+        r.val() = Vec3(out[0].val(), out[1].val(), out[2].val());
+        r.dx() = Vec3(out[0].dx(), out[1].dx(), out[2].dx());
+        r.dy() = Vec3(out[0].dy(), out[1].dy(), out[2].dy());
         return r;
     }
     const Matrix44 mm = kind == 2 ? m.inverse().transposed() : m;

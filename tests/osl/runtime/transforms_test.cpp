@@ -1,6 +1,7 @@
 // Coordinate-space and colour-space transforms whose spaces are fixed when the group is built:
 // one space to itself leaves the value as it is, without asking the renderer, while the same
 // spaces given per point still go through the lookup (and its errors).
+#include "../../../osl/runtime/transforms.h"
 #include "runtime_test_support.h"
 
 #include <OSL/oslexec.h>
@@ -128,6 +129,26 @@ TEST_F(FixedSpacesTest, EveryNameOfRgbIsOneSpace) {
     EXPECT_NEAR(hsv.x, 0.666667f - 0.25f / (6.0f * 1.75f), 1e-5f);
     EXPECT_NEAR(hsv.y, 0.875f, 1e-6f);
     EXPECT_FLOAT_EQ(hsv.z, 2.0f);
+}
+
+TEST(TransformDual, PointDerivativesFollowTheDivisionByW) {
+    // w = x + 1: the point (1, 0, 0) lands at x = 1/2, and d/dx of x / (x + 1) is 1/4.
+    Matrix44 m;
+    m[0][3] = 1.0f;
+    Dual2<Vec3> p(Vec3(1.0f, 0.0f, 0.0f), Vec3(1.0f, 0.0f, 0.0f), Vec3(0.0f, 2.0f, 0.0f));
+    const Dual2<Vec3> r = transformDual(m, p, 0);
+    EXPECT_FLOAT_EQ(r.val().x, 0.5f);
+    EXPECT_FLOAT_EQ(r.dx().x, 0.25f);
+    EXPECT_FLOAT_EQ(r.dy().y, 1.0f); // y / w with w = 2
+    // The same matrix moves vectors without the projective part.
+    const Dual2<Vec3> v = transformDual(m, p, 1);
+    EXPECT_EQ(v.val(), Vec3(1.0f, 0.0f, 0.0f));
+    EXPECT_EQ(v.dx(), Vec3(1.0f, 0.0f, 0.0f));
+    // A point sent to infinity comes out as the origin, derivatives included.
+    const Dual2<Vec3> q(Vec3(-1.0f, 3.0f, 0.0f), Vec3(1.0f), Vec3(1.0f));
+    const Dual2<Vec3> z = transformDual(m, q, 0);
+    EXPECT_EQ(z.val(), Vec3(0.0f));
+    EXPECT_EQ(z.dx(), Vec3(0.0f));
 }
 
 } // namespace
