@@ -1,7 +1,11 @@
 // Noise throughput through the public shading API: a 256x256 grid shaded with four octaves of
-// Perlin noise, colour noise and colour cell noise, once without and once with derivatives of
-// the noise (which switches the noise to its Dual2 evaluation). No texture lookup is part of it.
+// Perlin noise, colour noise, colour cell noise and one filtered texture lookup (of an image the
+// bench writes at start), once without and once with derivatives of the noise (which switches
+// the noise to its Dual2 evaluation).
 #include <OSL/oslexec.h>
+
+#include <OpenImageIO/filesystem.h>
+#include <OpenImageIO/imagebuf.h>
 
 #include <benchmark/benchmark.h>
 
@@ -12,19 +16,23 @@ namespace {
 
 using namespace OSL;
 
-// Cout = noise(q4) * fbm(P) + cellnoise(q4) with fbm four octaves of snoise; the second output,
-// slope, is Dx(fbm) when the `slope` variant is used.
+// Cout = noise(q4) * fbm(P) + cellnoise(q4) + texture(texname, u, v) with fbm four octaves of
+// snoise; the second output, slope, is Dx(fbm) when the `slope` variant is used.
 const char* kNoiseOso = R"(OpenShadingLanguage 1.00
 # Compiled by oslc 1.12.13.0
 shader noisebench
-oparam	color	Cout	0 0 0		%read{2147483647,-1} %write{18,18}
-oparam	float	slope	0		%read{2147483647,-1} %write{19,19}
+param	string	texname	""		%read{19,19} %write{2147483647,-1}
+oparam	color	Cout	0 0 0		%read{20,20} %write{18,20}
+oparam	float	slope	0		%read{2147483647,-1} %write{21,21}
 global	point	P	%read{0,0} %write{2147483647,-1} %derivs
+global	float	u	%read{19,19} %write{2147483647,-1} %derivs
+global	float	v	%read{19,19} %write{2147483647,-1} %derivs
 local	point	q	%read{1,16} %write{0,11} %derivs
 local	float	n	%read{2,14} %write{1,13} %derivs
-local	float	sum	%read{6,19} %write{2,14} %derivs
+local	float	sum	%read{6,21} %write{2,14} %derivs
 local	color	cn	%read{17,18} %write{15,17}
 local	color	cc	%read{18,18} %write{16,16}
+local	color	tc	%read{20,20} %write{19,19}
 const	float	$c8	8		%read{0,0} %write{2147483647,-1}
 const	float	$lac	2.03		%read{3,11} %write{2147483647,-1}
 const	float	$g1	0.5		%read{5,5} %write{2147483647,-1}
@@ -50,9 +58,27 @@ code ___main___
 	cellnoise	cc q 	%argrw{"wr"}
 	mul		cn cn sum 	%argrw{"wrr"}
 	add		Cout cn cc 	%argrw{"wrr"}
+	texture		tc texname u v 	%argrw{"wrrr"} %argderivs{2,3}
+	add		Cout Cout tc 	%argrw{"wrr"}
 	DERIV_OP
 	end
 )";
+
+// A 256x256 colour gradient written once per run into the temporary folder; empty on failure.
+std::string texturePath() {
+    static const std::string path = [] {
+        const std::string p =
+            OIIO::Filesystem::temp_directory_path() + "/tessel_noise_bench_ramp.exr";
+        OIIO::ImageBuf img(OIIO::ImageSpec(256, 256, 3, OIIO::TypeDesc::HALF));
+        for (int y = 0; y < 256; ++y)
+            for (int x = 0; x < 256; ++x) {
+                const float px[3] = {x / 255.0f, y / 255.0f, 0.5f};
+                img.setpixel(x, y, px, 3);
+            }
+        return img.write(p) ? p : std::string();
+    }();
+    return path;
+}
 
 struct Fixture {
     ShadingSystem ss;
@@ -66,7 +92,10 @@ struct Fixture {
                     derivs ? "Dx\t\tslope sum \t%argrw{\"wr\"} %argderivs{1}"
                            : "assign\t\tslope sum \t%argrw{\"wr\"}");
         if (!ss.LoadMemoryCompiledShader("noisebench", oso)) return;
+        const ustring tex(texturePath());
+        if (tex.empty()) return;
         group = ss.ShaderGroupBegin("");
+        ss.Parameter(*group, "texname", TypeString, &tex);
         ss.Shader(*group, "surface", "noisebench", "layer");
         ok = ss.ShaderGroupEnd(*group);
     }
