@@ -41,11 +41,13 @@ void DeclareArrayConstant(const OSOSymbol& symbol, HLSLGenGlobals& globals, int 
         for (size_t i = 0; i < values.size(); ++i)
             out << (i ? "," : "") << static_cast<int>(values[i]);
     } else if (element.is_float()) {
-        for (size_t i = 0; i < values.size(); ++i) out << (i ? "," : "") << values[i];
+        for (size_t i = 0; i < values.size(); ++i)
+            out << (i ? "," : "") << FloatLiteral(values[i], false);
     } else if (element.is_triple()) {
         for (size_t i = 0; i + 2 < values.size(); i += 3)
-            out << (i ? "," : "") << "float3(" << values[i] << "," << values[i + 1] << ","
-                << values[i + 2] << ") ";
+            out << (i ? "," : "") << "float3(" << FloatLiteral(values[i], false) << ","
+                << FloatLiteral(values[i + 1], false) << "," << FloatLiteral(values[i + 2], false)
+                << ") ";
     } else if (element.is_string()) {
         // Strings are their hashes in the viewport, element by element.
         const std::vector<std::string>& texts = symbol.stringDefaults;
@@ -53,7 +55,8 @@ void DeclareArrayConstant(const OSOSymbol& symbol, HLSLGenGlobals& globals, int 
     } else if (element.is_matrix()) {
         for (size_t i = 0; i + 15 < values.size(); i += 16) {
             out << (i ? "," : "") << "float4x4(";
-            for (size_t k = 0; k < 16; ++k) out << (k ? "," : "") << values[i + k];
+            for (size_t k = 0; k < 16; ++k)
+                out << (k ? "," : "") << FloatLiteral(values[i + k], false);
             out << ") ";
         }
     } else {

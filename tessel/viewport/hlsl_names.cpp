@@ -3,6 +3,9 @@
 
 #include <OpenImageIO/hash.h>
 
+#include <cmath>
+#include <cstdlib>
+#include <iomanip>
 #include <sstream>
 
 namespace oslo {
@@ -64,25 +67,39 @@ std::string HLSLName(std::string_view name) {
     return result;
 }
 
+std::string FloatLiteral(float value, bool showPoint) {
+    std::ostringstream out;
+    if (showPoint) out.setf(std::ios::showpoint);
+    out << value;
+    std::string text = out.str();
+    if (std::isfinite(value) && std::strtof(text.c_str(), nullptr) != value) {
+        out.str({});
+        out << std::setprecision(9) << value;
+        text = out.str();
+    }
+    return text;
+}
+
 bool ConstantExpression(const OSOSymbol& symbol, std::string& text) {
     const OSL::TypeSpec& type = symbol.type;
     if (type.is_closure_based() || type.is_array()) return false;
     const std::vector<float>& values = symbol.floatDefaults;
     std::ostringstream out;
-    out.setf(std::ios::showpoint);
+    const auto lit = [](float v) { return FloatLiteral(v, true); };
     if (type.is_float()) {
         if (values.size() != 1) return false;
-        out << values[0];
+        out << lit(values[0]);
     } else if (type.is_int()) {
         if (values.size() != 1) return false;
         out << static_cast<int>(values[0]);
     } else if (type.is_triple()) {
         if (values.size() != 3) return false;
-        out << "float3(" << values[0] << ", " << values[1] << ", " << values[2] << ")";
+        out << "float3(" << lit(values[0]) << ", " << lit(values[1]) << ", " << lit(values[2])
+            << ")";
     } else if (type.is_matrix()) {
         if (values.size() != 16) return false;
         out << "float4x4(";
-        for (size_t i = 0; i < 16; ++i) out << (i ? ", " : "") << values[i];
+        for (size_t i = 0; i < 16; ++i) out << (i ? ", " : "") << lit(values[i]);
         out << ") ";
     } else if (type.is_string()) {
         out << StringHash(symbol.stringDefault) << "/*" << symbol.stringDefault << "*/";

@@ -21,6 +21,11 @@ std::string SymbolExpression(const OSOSymbol& symbol, HLSLGenGlobals& globals);
 // "$" and "." become "_" and a "_" is appended, so that no shader name meets an HLSL keyword.
 std::string HLSLName(std::string_view name);
 
+// A float literal: six significant digits when they read back as the same float (1 gives
+// 1.00000 with `showPoint`), otherwise nine, so that the viewport computes with the very constant
+// the CPU shading system uses (hash noise of a rounded constant is a different pattern).
+std::string FloatLiteral(float value, bool showPoint);
+
 // The literal of a constant symbol; false when its type and defaults do not fit.
 bool ConstantExpression(const OSOSymbol& symbol, std::string& text);
 

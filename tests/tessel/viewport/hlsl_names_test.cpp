@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdlib>
+
 namespace {
 
 oslo::OSOSymbol Constant(OIIO::TypeDesc type, std::vector<float> values, std::string text = {}) {
@@ -44,6 +46,23 @@ TEST(ConstantExpression, FormatsNumbersWithADecimalPoint) {
               "float3(1.00000, 0.500000, 0.00000)");
     EXPECT_EQ(Text(Constant(OIIO::TypeDesc::TypeVector, {0.0f, 1e-9f, -2.0f})),
               "float3(0.00000, 1.00000e-09, -2.00000)");
+}
+
+TEST(ConstantExpression, ConstantsThatSixDigitsCannotHoldGetNine) {
+    // Rounded to six digits these would read back as other floats, and hash noise of a slightly
+    // different constant is an unrelated pattern.
+    const float pi = 3.14159265358979f;
+    const float cosine = 0.984807729721069336f;
+    EXPECT_EQ(Text(Constant(OIIO::TypeDesc::TypeFloat, {pi})), "3.14159274");
+    EXPECT_EQ(Text(Constant(OIIO::TypeDesc::TypeColor, {cosine, 0.25f, -pi})),
+              "float3(0.984807730, 0.250000, -3.14159274)");
+    for (float v : {pi, cosine, 1.0f / 3.0f, 1e-7f, 123456.789f}) {
+        const std::string text = oslo::FloatLiteral(v, true);
+        EXPECT_EQ(std::strtof(text.c_str(), nullptr), v) << text;
+        const std::string plain = oslo::FloatLiteral(v, false);
+        EXPECT_EQ(std::strtof(plain.c_str(), nullptr), v) << plain;
+    }
+    EXPECT_EQ(oslo::FloatLiteral(0.5f, false), "0.5");
 }
 
 TEST(ConstantExpression, MatrixHasSixteenValuesAndATrailingBlank) {
