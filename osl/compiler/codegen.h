@@ -98,7 +98,7 @@ private:
 
     // expressions
     Symbol* expr(const Node* e, const TypeSpec* expected = nullptr);
-    Symbol* binary(const Node* e);
+    Symbol* binary(const Node* e, const TypeSpec* expected = nullptr);
     Symbol* logical(const Node* e);
     Symbol* unary(const Node* e);
     Symbol* incdec(const Node* e);

@@ -76,7 +76,7 @@ Symbol* CodeGen::expr(const Node* e, const TypeSpec* expected) {
         r = incdec(e);
         break;
     case NodeKind::Binary:
-        r = (e->op == "&&" || e->op == "||") ? logical(e) : binary(e);
+        r = (e->op == "&&" || e->op == "||") ? logical(e) : binary(e, expected);
         break;
     case NodeKind::Ternary:
         r = ternary(e);
@@ -416,9 +416,16 @@ static TypeSpec arithmeticResult(const std::string& op, const TypeSpec& a, const
     return kFloat;
 }
 
-Symbol* CodeGen::binary(const Node* e) {
-    Symbol* a = expr(e->kid(0));
-    Symbol* b = expr(e->kid(1));
+Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected) {
+    // The type wanted of an arithmetic result is also wanted of its operands, so that
+    // `color C = x * noise(P)` calls the colour noise, as oslc does.
+    const bool arithmetic = e->op == "+" || e->op == "-" || e->op == "*" || e->op == "/";
+    const TypeSpec* wanted = arithmetic && expected && !expected->is_void() ? expected : nullptr;
+    const auto operand = [&](const Node* k) {
+        return expr(k, k && k->kind != NodeKind::InitList ? wanted : nullptr);
+    };
+    Symbol* a = operand(e->kid(0));
+    Symbol* b = operand(e->kid(1));
     m_curLine = e->line;
     m_curFile = e->file;
     static const std::map<std::string, std::string> overloadNames = {

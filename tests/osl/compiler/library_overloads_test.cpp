@@ -80,3 +80,26 @@ TEST(LibraryOverloads, CastPicksTheOverloadReturningItsType) {
     EXPECT_NE(oso.find("temp\tfloat\t$tmp3\t"), std::string::npos) << oso;
     EXPECT_NE(oso.find("\tnoise\t\t$tmp3 $const"), std::string::npos) << oso;
 }
+
+// The type an assignment wants reaches the operands of arithmetic: `Cout = x * noise(P)` scales
+// the colour noise, while a comparison's operands choose on their own.
+TEST(LibraryOverloads, ArithmeticPassesTheWantedTypeToItsOperands) {
+    Errors eh;
+    std::string oso = compileOrFail("shader t (float x = 1, output color Cout = 0) {\n"
+                                    "    Cout = x * noise (P);\n"
+                                    "    float f = 2 * noise (P) + 1;\n"
+                                    "    int big = noise (P) > 0.5;\n"
+                                    "    Cout += f * big;\n"
+                                    "}\n",
+                                    eh);
+    ASSERT_FALSE(oso.empty()) << (eh.errors.empty() ? "" : eh.errors[0]);
+    EXPECT_NE(oso.find("temp\tcolor\t$tmp1\t"), std::string::npos) << oso;
+    EXPECT_NE(oso.find("\tnoise\t\t$tmp1 P"), std::string::npos) << oso;
+    EXPECT_NE(oso.find("\tmul\t\tCout x $tmp1"), std::string::npos) << oso;
+    // The other two calls stay float noise.
+    size_t colorTemps = 0;
+    for (size_t at = oso.find("temp\tcolor\t"); at != std::string::npos;
+         at = oso.find("temp\tcolor\t", at + 1))
+        ++colorTemps;
+    EXPECT_EQ(colorTemps, 1u) << oso;
+}
