@@ -748,8 +748,10 @@ void CodeGen::varDecl(const Node* d) {
             error(v.get(), "type name '" + v->name + "' can't be used as a variable");
         }
         Symbol* s = newStructSymbol(scopedName(v->name), t, SymTypeLocal);
-        declare(v->name, s, v.get());
+        // The name is visible only after its initialiser, which still sees an outer variable
+        // of the same name: `string name = cond ? "x" : name;`.
         if (init) initVariable(s, init, v.get(), true);
+        declare(v->name, s, v.get());
     }
 }
 

@@ -175,3 +175,21 @@ TEST(Compiler, NoShaderIsAnError) {
 }
 
 } // namespace
+
+// A declaration's initialiser still sees the outer variable it is about to hide, as oslc has it.
+TEST(CompilerScopes, InitialiserReadsTheOuterVariableOfTheSameName) {
+    auto r = compile("shader t (string filename = \"a.tif\") {\n"
+                     "    if (u > 0) {\n"
+                     "        string filename = (u > 0.5) ? \"b\" : filename;\n"
+                     "        printf(\"%s\", filename);\n"
+                     "    }\n"
+                     "}\n");
+    ASSERT_TRUE(r->ok) << (r->eh.errors.empty() ? "" : r->eh.errors[0]);
+    const size_t inner = r->oso.find("local\tstring\t");
+    ASSERT_NE(inner, std::string::npos) << r->oso;
+    const size_t start = inner + 13;
+    const std::string innerName = r->oso.substr(start, r->oso.find('\t', start) - start);
+    // The inner variable is assigned from the parameter, never from itself.
+    EXPECT_TRUE(hasLine(r->oso, "\tassign\t\t" + innerName + " filename ")) << r->oso;
+    EXPECT_FALSE(hasLine(r->oso, " " + innerName + " " + innerName)) << r->oso;
+}
