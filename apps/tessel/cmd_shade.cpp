@@ -1,6 +1,7 @@
 // `tessel shade`: runs a shader group over a grid of shading points the way OSL's testshade
 // does, with its command line, its console output and its images (through OpenImageIO).
 #include "command_registry.h"
+#include "shade_renderer.h"
 
 #include <OSL/oslclosure.h>
 #ifdef TESSEL_HAVE_OSL_COMPILER
@@ -12,6 +13,7 @@
 #include <OpenImageIO/imagebuf.h>
 #include <OpenImageIO/strutil.h>
 
+#include <chrono>
 #include <cmath>
 #include <cstdio>
 #include <cstring>
@@ -25,14 +27,9 @@
 namespace {
 
 using namespace OSL;
-
-// A value typed from the command line: a --param, --reparam or --userdata.
-struct TypedValue {
-    std::string name;
-    TypeDesc type;
-    std::vector<char> data;
-    bool lockgeom = true;
-};
+using tessel_shade::GridRenderer;
+using tessel_shade::registerClosures;
+using tessel_shade::TypedValue;
 
 // Every message goes to stdout in the order it is made, so that shader output, warnings and
 // errors interleave as they happened.
@@ -60,279 +57,6 @@ public:
     }
 };
 
-// The renderer of the grid: "shader" and "object" space are fixed transformations and
-// "myspace" the only named one. The camera sits at the origin of common space, so transforming
-// into "camera" (or screen, NDC, raster) works while transforming out of it is unknown, as in
-// testshade.
-class GridRenderer final : public RendererServices {
-public:
-    GridRenderer() {
-        m_shader.translate(Vec3(1.0f, 0.0f, 0.0f));
-        m_shader.rotate(Vec3(0.0f, 0.0f, float(M_PI_4)));
-        m_object.translate(Vec3(0.0f, 1.0f, 0.0f));
-        m_object.rotate(Vec3(0.0f, 0.0f, float(M_PI_2)));
-        Matrix44 myspace;
-        myspace.scale(Vec3(1.0f, 2.0f, 1.0f));
-        m_named[ustring("myspace")] = myspace;
-    }
-    void setResolution(int x, int y) { m_xres = x, m_yres = y; }
-
-    // The camera of the grid: a perspective view of the unit square.
-    bool get_attribute(ShaderGlobals*, bool derivatives, ustring, TypeDesc type, ustring name,
-                       void* val) override {
-        const std::string_view n = name.string();
-        auto floats = [&](std::initializer_list<float> v) {
-            if (type != TypeDesc(TypeDesc::FLOAT, int(v.size())) &&
-                !(v.size() == 1 && type == TypeFloat))
-                return false;
-            float* out = static_cast<float*>(val);
-            int k = 0;
-            for (float f : v) out[k++] = f;
-            if (derivatives) std::memset(out + k, 0, 2 * v.size() * sizeof(float));
-            return true;
-        };
-        if (n == "camera:resolution" && type == TypeDesc(TypeDesc::INT, 2)) {
-            static_cast<int*>(val)[0] = m_xres;
-            static_cast<int*>(val)[1] = m_yres;
-            return true;
-        }
-        if (n == "camera:projection" && type == TypeString) {
-            *static_cast<ustring*>(val) = ustring("perspective");
-            return true;
-        }
-        if (n == "camera:fov") return floats({90.0f});
-        if (n == "camera:pixelaspect") return floats({1.0f});
-        if (n == "camera:clip_near") return floats({0.1f});
-        if (n == "camera:clip_far") return floats({1000.0f});
-        if (n == "camera:clip") return floats({0.1f, 1000.0f});
-        if (n == "camera:shutter_open") return floats({0.0f});
-        if (n == "camera:shutter_close") return floats({1.0f});
-        if (n == "camera:shutter") return floats({0.0f, 1.0f});
-        if (n == "camera:screen_window") {
-            const float aspect = float(m_xres) / float(m_yres);
-            return floats({-aspect, -1.0f, aspect, 1.0f});
-        }
-        return false;
-    }
-    bool get_matrix(ShaderGlobals*, Matrix44& result, TransformationPtr xform, float) override {
-        if (!xform) return false;
-        result = *static_cast<const Matrix44*>(xform);
-        return true;
-    }
-    bool get_matrix(ShaderGlobals*, Matrix44& result, ustring from, float) override {
-        auto it = m_named.find(from);
-        if (it == m_named.end()) return false;
-        result = it->second;
-        return true;
-    }
-    bool get_matrix(ShaderGlobals* sg, Matrix44& result, TransformationPtr xform) override {
-        return get_matrix(sg, result, xform, 0.0f);
-    }
-    bool get_matrix(ShaderGlobals* sg, Matrix44& result, ustring from) override {
-        return get_matrix(sg, result, from, 0.0f);
-    }
-    bool get_inverse_matrix(ShaderGlobals*, Matrix44& result, ustring to, float) override {
-        if (to == "camera" || to == "screen" || to == "NDC" || to == "raster") {
-            result = cameraToSpace(to);
-            return true;
-        }
-        auto it = m_named.find(to);
-        if (it == m_named.end()) return false;
-        result = it->second.inverse();
-        return true;
-    }
-    bool get_inverse_matrix(ShaderGlobals* sg, Matrix44& result, ustring to) override {
-        return get_inverse_matrix(sg, result, to, 0.0f);
-    }
-    // Geometry data of the grid: values given with --userdata, and "s" and "t" following u
-    // and v.
-    bool get_userdata(bool derivatives, ustring name, TypeDesc type, ShaderGlobals* sg,
-                      void* val) override {
-        for (const TypedValue& u : userdata) {
-            if (u.name != name.string()) continue;
-            const TypeDesc ut = u.type;
-            const size_t n = type.numelements() * type.aggregate;
-            const size_t have = ut.numelements() * ut.aggregate;
-            if (ut.basetype == TypeDesc::STRING || type.basetype == TypeDesc::STRING) {
-                if (ut != type) return false;
-                std::memcpy(val, u.data.data(), type.size());
-                return true;
-            }
-            if (have != n && have != 1) return false;
-            for (size_t k = 0; k < n; ++k) {
-                const size_t from = have == 1 ? 0 : k;
-                const float f = ut.basetype == TypeDesc::INT
-                                    ? float(reinterpret_cast<const int*>(u.data.data())[from])
-                                    : reinterpret_cast<const float*>(u.data.data())[from];
-                if (type.basetype == TypeDesc::INT)
-                    static_cast<int*>(val)[k] = int(f);
-                else
-                    static_cast<float*>(val)[k] = f;
-            }
-            if (derivatives && type.basetype == TypeDesc::FLOAT)
-                std::memset(static_cast<float*>(val) + n, 0, 2 * n * sizeof(float));
-            return true;
-        }
-        if (type != TypeFloat || (name != "s" && name != "t")) return false;
-        float* out = static_cast<float*>(val);
-        const bool isS = name == "s";
-        out[0] = isS ? sg->u : sg->v;
-        if (derivatives) {
-            out[1] = isS ? sg->dudx : sg->dvdx;
-            out[2] = isS ? sg->dudy : sg->dvdy;
-        }
-        return true;
-    }
-    // Common (= camera) space to the camera's screen, NDC or raster space: a 90 degree
-    // perspective with clipping planes at 0.1 and 1000 and the screen spanning [-1, 1]
-    // vertically.
-    Matrix44 cameraToSpace(ustring to) const {
-        Matrix44 m; // the camera is common space itself
-        if (to == "camera") return m;
-        const float hither = 0.1f, yon = 1000.0f;
-        const float depth = yon - hither;
-        const float invTan = 1.0f / std::tan(0.5f * 90.0f * float(M_PI) / 180.0f);
-        m = m * Matrix44(invTan, 0, 0, 0, 0, invTan, 0, 0, 0, 0, yon / depth, 1, 0, 0,
-                         -yon * hither / depth, 0);
-        if (to == "screen") return m;
-        m = m * Matrix44(0.5f, 0, 0, 0, 0, 0.5f, 0, 0, 0, 0, 1, 0, 0.5f, 0.5f, 0, 1);
-        if (to == "NDC") return m;
-        return m * Matrix44(float(m_xres), 0, 0, 0, 0, float(m_yres), 0, 0, 0, 0, 1, 0, 0, 0, 0, 1);
-    }
-    const Matrix44* shaderMatrix() const { return &m_shader; }
-    const Matrix44* objectMatrix() const { return &m_object; }
-
-private:
-    Matrix44 m_shader, m_object;
-    std::map<ustring, Matrix44> m_named;
-    int m_xres = 1, m_yres = 1;
-
-public:
-    std::vector<TypedValue> userdata; // set before shading starts, read-only while it runs
-};
-
-// The closures a renderer of this kind knows, in the layouts OSL's test renderers use.
-struct EmptyParams {};
-struct DiffuseParams {
-    Vec3 N;
-    ustring label;
-};
-struct OrenNayarParams {
-    Vec3 N;
-    float sigma;
-};
-struct TranslucentParams {
-    Vec3 N;
-    ustring label;
-};
-struct PhongParams {
-    Vec3 N;
-    float exponent;
-    ustring label;
-};
-struct WardParams {
-    Vec3 N, T;
-    float ax, ay;
-};
-struct MicrofacetParams {
-    ustring dist;
-    Vec3 N, U;
-    float xalpha, yalpha, eta;
-    int refract;
-};
-struct ReflectionParams {
-    Vec3 N;
-    float eta;
-};
-struct DebugParams {
-    ustring tag;
-};
-// A closure taking one parameter of every kind, positional and keyword, to show how each
-// travels from the shader to the renderer.
-struct ParameterTestParams {
-    int intParam;
-    float floatParam;
-    Color3 colorParam;
-    Vec3 vectorParam;
-    ustring stringParam;
-    int intArray[5];
-    Vec3 vectorArray[5];
-    Color3 colorArray[5];
-    float floatArray[5];
-    ustring stringArray[5];
-    int intKey;
-    float floatKey;
-    Color3 colorKey;
-    Vec3 vectorKey;
-    ustring stringKey;
-};
-
-void registerClosures(ShadingSystem& ss) {
-    const ClosureParam none[] = {CLOSURE_FINISH_PARAM(EmptyParams)};
-    const ClosureParam diffuse[] = {CLOSURE_VECTOR_PARAM(DiffuseParams, N),
-                                    CLOSURE_STRING_KEYPARAM(DiffuseParams, label, "label"),
-                                    CLOSURE_FINISH_PARAM(DiffuseParams)};
-    const ClosureParam oren[] = {CLOSURE_VECTOR_PARAM(OrenNayarParams, N),
-                                 CLOSURE_FLOAT_PARAM(OrenNayarParams, sigma),
-                                 CLOSURE_FINISH_PARAM(OrenNayarParams)};
-    const ClosureParam translucent[] = {CLOSURE_VECTOR_PARAM(TranslucentParams, N),
-                                        CLOSURE_FINISH_PARAM(TranslucentParams)};
-    const ClosureParam phong[] = {
-        CLOSURE_VECTOR_PARAM(PhongParams, N), CLOSURE_FLOAT_PARAM(PhongParams, exponent),
-        CLOSURE_STRING_KEYPARAM(PhongParams, label, "label"), CLOSURE_FINISH_PARAM(PhongParams)};
-    const ClosureParam ward[] = {
-        CLOSURE_VECTOR_PARAM(WardParams, N), CLOSURE_VECTOR_PARAM(WardParams, T),
-        CLOSURE_FLOAT_PARAM(WardParams, ax), CLOSURE_FLOAT_PARAM(WardParams, ay),
-        CLOSURE_FINISH_PARAM(WardParams)};
-    const ClosureParam microfacet[] = {CLOSURE_STRING_PARAM(MicrofacetParams, dist),
-                                       CLOSURE_VECTOR_PARAM(MicrofacetParams, N),
-                                       CLOSURE_VECTOR_PARAM(MicrofacetParams, U),
-                                       CLOSURE_FLOAT_PARAM(MicrofacetParams, xalpha),
-                                       CLOSURE_FLOAT_PARAM(MicrofacetParams, yalpha),
-                                       CLOSURE_FLOAT_PARAM(MicrofacetParams, eta),
-                                       CLOSURE_INT_PARAM(MicrofacetParams, refract),
-                                       CLOSURE_FINISH_PARAM(MicrofacetParams)};
-    const ClosureParam reflection[] = {CLOSURE_VECTOR_PARAM(ReflectionParams, N),
-                                       CLOSURE_FINISH_PARAM(ReflectionParams)};
-    const ClosureParam fresnel[] = {CLOSURE_VECTOR_PARAM(ReflectionParams, N),
-                                    CLOSURE_FLOAT_PARAM(ReflectionParams, eta),
-                                    CLOSURE_FINISH_PARAM(ReflectionParams)};
-    const ClosureParam debug[] = {CLOSURE_STRING_PARAM(DebugParams, tag),
-                                  CLOSURE_FINISH_PARAM(DebugParams)};
-    using PT = ParameterTestParams;
-    const ClosureParam parameterTest[] = {CLOSURE_INT_PARAM(PT, intParam),
-                                          CLOSURE_FLOAT_PARAM(PT, floatParam),
-                                          CLOSURE_COLOR_PARAM(PT, colorParam),
-                                          CLOSURE_VECTOR_PARAM(PT, vectorParam),
-                                          CLOSURE_STRING_PARAM(PT, stringParam),
-                                          CLOSURE_INT_ARRAY_PARAM(PT, intArray, 5),
-                                          CLOSURE_VECTOR_ARRAY_PARAM(PT, vectorArray, 5),
-                                          CLOSURE_COLOR_ARRAY_PARAM(PT, colorArray, 5),
-                                          CLOSURE_FLOAT_ARRAY_PARAM(PT, floatArray, 5),
-                                          CLOSURE_STRING_ARRAY_PARAM(PT, stringArray, 5),
-                                          CLOSURE_INT_KEYPARAM(PT, intKey, "int_key"),
-                                          CLOSURE_FLOAT_KEYPARAM(PT, floatKey, "float_key"),
-                                          CLOSURE_COLOR_KEYPARAM(PT, colorKey, "color_key"),
-                                          CLOSURE_VECTOR_KEYPARAM(PT, vectorKey, "vector_key"),
-                                          CLOSURE_STRING_KEYPARAM(PT, stringKey, "string_key"),
-                                          CLOSURE_FINISH_PARAM(PT)};
-    ss.register_closure("emission", 1, none, nullptr, nullptr);
-    ss.register_closure("background", 2, none, nullptr, nullptr);
-    ss.register_closure("diffuse", 3, diffuse, nullptr, nullptr);
-    ss.register_closure("oren_nayar", 4, oren, nullptr, nullptr);
-    ss.register_closure("translucent", 5, translucent, nullptr, nullptr);
-    ss.register_closure("phong", 6, phong, nullptr, nullptr);
-    ss.register_closure("ward", 7, ward, nullptr, nullptr);
-    ss.register_closure("microfacet", 8, microfacet, nullptr, nullptr);
-    ss.register_closure("reflection", 9, reflection, nullptr, nullptr);
-    ss.register_closure("reflection", 10, fresnel, nullptr, nullptr);
-    ss.register_closure("refraction", 11, fresnel, nullptr, nullptr);
-    ss.register_closure("transparent", 12, none, nullptr, nullptr);
-    ss.register_closure("debug", 13, debug, nullptr, nullptr);
-    ss.register_closure("holdout", 14, none, nullptr, nullptr);
-    ss.register_closure("parameter_test", 15, parameterTest, nullptr, nullptr);
-}
-
 struct OutputRequest {
     std::string symbol, file;
 };
@@ -341,6 +65,7 @@ struct ShadeOptions {
     int xres = 1, yres = 1;
     int threads = 1;
     int iters = 1;
+    bool runstats = false; // print setup, shading and writing times
     bool center = false, varyPdxdy = false, varyUdxdy = false, varyVdxdy = false;
     bool print = false, verbose = false, debug = false;
     float uoffset = 0, voffset = 0, uscale = 1, vscale = 1;
@@ -537,6 +262,8 @@ std::string exprShaderSource(const std::string& shadername, const std::string& e
 }
 
 int runShade(const std::vector<std::string>& args) {
+    using Clock = std::chrono::steady_clock;
+    const Clock::time_point started = Clock::now();
     ConsoleErrors errors;
     GridRenderer renderer;
     ShadeOptions opt;
@@ -613,8 +340,10 @@ int runShade(const std::vector<std::string>& args) {
             if (!need(1)) break;
             opt.raytype = args[++i];
         } else if (base == "-raytype_opt" || base == "-groupoutputs" || base == "-debug2" ||
-                   base == "-stats" || base == "-runstats" || base == "-llvm_debug") {
+                   base == "-stats" || base == "-llvm_debug") {
             // The outputs are this group's in any case; the rest concern the reference's JIT.
+        } else if (base == "-runstats") {
+            opt.runstats = true;
         } else if (base == "-O0" || base == "-O1" || base == "-O2" || base == "-O") {
             ss.attribute("optimize", base == "-O0" ? 0 : base == "-O1" ? 1 : 2);
         } else if (base == "-v") {
@@ -825,6 +554,7 @@ int runShade(const std::vector<std::string>& args) {
     renderer.setResolution(opt.xres, opt.yres);
     const int raytypeBit = ss.raytype_bit(ustring(opt.raytype));
     const int nthreads = std::min(opt.threads, opt.yres);
+    const Clock::time_point shadingStarts = Clock::now();
     for (int iter = 0; iter < opt.iters; ++iter) {
         const bool last = iter == opt.iters - 1;
         auto shadeRows = [&](int y0, int y1) {
@@ -862,6 +592,7 @@ int runShade(const std::vector<std::string>& args) {
                 ss.ReParameter(*group, opt.reparamLayer, v.name, v.type, v.data.data());
     }
 
+    const Clock::time_point shadingEnds = Clock::now();
     int status = 0;
     if (opt.outputs.empty()) std::printf("\n");
     for (size_t k = 0; k < images.size(); ++k) {
@@ -882,6 +613,17 @@ int runShade(const std::vector<std::string>& args) {
                         img.buf->geterror().c_str());
             status = 1;
         }
+    }
+    if (opt.runstats) {
+        const auto seconds = [](Clock::time_point a, Clock::time_point b) {
+            return std::chrono::duration<double>(b - a).count();
+        };
+        const double run = seconds(shadingStarts, shadingEnds);
+        const double points = double(opt.xres) * opt.yres * opt.iters;
+        std::printf("Setup: %.3fs\nRun  : %.3fs (%.0f points, %d threads, %.0f points/s)\n"
+                    "Write: %.3fs\n",
+                    seconds(started, shadingStarts), run, points, std::max(nthreads, 1),
+                    run > 0 ? points / run : 0.0, seconds(shadingEnds, Clock::now()));
     }
     std::fflush(stdout);
     return status;
