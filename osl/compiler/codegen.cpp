@@ -457,9 +457,10 @@ std::string CodeGen::metaHint(const Node* m) {
     }
     if (t.is_unsized_array()) t.make_array(int(iv.size() + sv.size() + fv.size()));
     std::string h = "%meta{" + t.string() + "," + m->name;
-    for (int i : iv) h += "," + std::to_string(i);
-    for (float f : fv) h += "," + formatFloat(f);
-    for (const auto& s : sv) h += "," + quoteString(s);
+    // Appended piecewise: `"," + temporary` trips a false overlap warning in GCC 12's string.
+    for (int i : iv) h.append(",").append(std::to_string(i));
+    for (float f : fv) h.append(",").append(formatFloat(f));
+    for (const auto& s : sv) h.append(",").append(quoteString(s));
     return h + "}";
 }
 

@@ -113,7 +113,7 @@ private:
     Symbol* fieldRead(const Node* e);
     LRef lvalue(const Node* e, bool forWrite);
     Symbol* load(const LRef& r, const Node* at);
-    void store(const LRef& r, Symbol* value, const Node* at);
+    void store(const LRef& r, Symbol* value, const Node* at, bool checkWrite = true);
     Symbol* convert(Symbol* v, const TypeSpec& to, const Node* at);
     void assignInto(Symbol* dst, Symbol* src, const Node* at);
     bool retarget(Symbol* dst, Symbol* src);

@@ -318,9 +318,9 @@ Symbol* CodeGen::load(const LRef& r, const Node* at) {
     return base;
 }
 
-void CodeGen::store(const LRef& r, Symbol* value, const Node* at) {
+void CodeGen::store(const LRef& r, Symbol* value, const Node* at, bool checkWrite) {
     if (!r.sym) return;
-    checkWritable(r.sym, at);
+    if (checkWrite) checkWritable(r.sym, at);
     if (r.sym->type.elementtype().is_matrix() && r.comp && !r.comp2) {
         error(at, "indexing into non-array or non-component type");
         return;
@@ -571,7 +571,7 @@ Symbol* CodeGen::assign(const Node* e) {
             return v;
         }
         checkWritable(r.sym, e, "", true);
-        store(r, v, e);
+        store(r, v, e, false);
         return v->renamedTo ? v->renamedTo : v;
     }
     Symbol* cur = load(r, e);
