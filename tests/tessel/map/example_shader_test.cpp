@@ -27,7 +27,7 @@ TEST(ExampleShader, CompilesToFiveParametersTwoOutputsAndTheirEntries) {
     EXPECT_EQ(registry.OutputIndex(key, 0), 3);
     EXPECT_EQ(registry.OutputIndex(key, 1), 4);
     EXPECT_EQ(registry.OutputIndex(key, 2), -1);
-    EXPECT_EQ(registry.MetadataValue(key, "", "URL"), "https://example.org/osl");
+    EXPECT_EQ(registry.MetadataValue(key, "", "URL"), "https://tessel.dev/docs/example");
     EXPECT_EQ(registry.MetadataValue(key, "Mixer", "max"), "1");
     EXPECT_EQ(registry.MetadataValue(key, "Mixer", "nothing"), "");
     EXPECT_EQ(registry.MetadataValue(key, "Nobody", "max"), "");
