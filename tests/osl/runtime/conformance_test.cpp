@@ -15,9 +15,9 @@ namespace fs = std::filesystem;
 
 namespace {
 
-// Cases the shading system passes with the reference compiler's OSO, and the cases that pass end
-// to end with our own compiler (image-heavy regression cases run only there); each must keep
-// passing.
+// Cases the shading system passes with the reference compiler's OSO, and further cases that pass
+// end to end with our own compiler (each case runs once, to keep the suite's time down); each
+// must keep passing.
 const char* const kReferenceOsoCases[] = {
 #include "conformance_passing.inc"
 };
