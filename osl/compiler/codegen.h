@@ -129,7 +129,9 @@ private:
     FunctionSymbol* resolveOverload(const std::string& name, const std::vector<TypeSpec>& argTypes,
                                     const Node* at, const TypeSpec* expected, bool report = true);
     Symbol* builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
-                        std::vector<LRef>& refs, const TypeSpec* expected);
+                        std::vector<LRef>& refs, const TypeSpec* expected,
+                        bool formatChecked = false);
+    bool checkFormatCall(FunctionSymbol* fn, const Node* e, const std::vector<TypeSpec>& types);
 
     Diagnostics& m_diag;
     const std::vector<std::string>& m_files;

@@ -1,6 +1,7 @@
 // Expressions: type rules, implicit conversions, l-values (array elements, components, matrix
 // cells, struct fields), calls with overload resolution, and inlining of user functions.
 #include "codegen.h"
+#include "format_check.h"
 
 #include <algorithm>
 #include <functional>
@@ -668,6 +669,9 @@ Symbol* CodeGen::typeCtor(const Node* e) {
             error(e, "Cannot construct " + t.string() + " from " + from.string());
             return temp(t);
         }
+        // A cast to the type the value already has is no conversion at all: oslc passes the
+        // value through rather than copying it.
+        if (e->isCast && from == t) return args[0];
         Symbol* r = temp(t);
         emit("assign", {r, args[0]});
         return r;
@@ -996,7 +1000,9 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
                       ", as passed to function " + fn->name + "() as arg " + std::to_string(i + 1) +
                           " (output parameter \"" + fn->params[i].name + "\")");
     }
-    if (fn->builtin) return builtinCall(fn, e, args, refs, expected);
+    bool formatChecked = fn->builtin && isFormatFunction(fn->name) && fn->file == "stdosl.h" &&
+                         checkFormatCall(fn, e, types);
+    if (fn->builtin) return builtinCall(fn, e, args, refs, expected, formatChecked);
     if (dest &&
         (!canTarget(dest, fn->ret) || std::find(args.begin(), args.end(), dest) != args.end()))
         dest = nullptr;
@@ -1005,8 +1011,45 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
     return inlineCall(fn, e, args, refs, dest);
 }
 
+// Checks the values of a printf-like call against its format string, when that is a literal.
+// True when the format was checked (its messages then cover struct values too).
+bool CodeGen::checkFormatCall(FunctionSymbol* fn, const Node* e,
+                              const std::vector<TypeSpec>& types) {
+    size_t formatIndex = fn->name == "fprintf" ? 1 : 0;
+    const Node* format = formatIndex < e->kids.size() ? e->kids[formatIndex].get() : nullptr;
+    if (!format || format->kind != NodeKind::StringLit) {
+        warning(e, fn->name + "() uses a format string that is not a constant.");
+        return false;
+    }
+    std::vector<TypeSpec> values(types.begin() + formatIndex + 1, types.end());
+    std::string msg =
+        checkFormatArguments(fn->name, format->stringValue, values, int(formatIndex) + 2);
+    if (!msg.empty()) error(e, msg);
+    return true;
+}
+
+// The arguments (counted from the result, 0) whose derivatives an op reads, written to the OSO as
+// %argderivs so that the renderer keeps derivatives for them: the value being differentiated,
+// texture coordinates when no explicit derivatives follow them, and the position (and period)
+// arguments of a named noise.
+static std::vector<int> derivativeArgs(const std::string& op, const std::vector<Symbol*>& a) {
+    const auto isString = [&](size_t i) { return i < a.size() && a[i] && a[i]->type.is_string(); };
+    if (op == "Dx" || op == "Dy" || op == "Dz" || op == "area" || op == "filterwidth" ||
+        op == "calculatenormal")
+        return {1};
+    if (op == "texture" && (a.size() == 4 || isString(4))) return {2, 3};
+    if ((op == "texture3d" || op == "environment") && (a.size() == 3 || isString(3))) return {2};
+    if (op == "trace") return {1, 2};
+    if ((op == "noise" || op == "pnoise") && isString(1)) {
+        std::vector<int> r;
+        for (size_t i = 2; i < a.size() && !isString(i); ++i) r.push_back(int(i));
+        return r;
+    }
+    return {};
+}
+
 Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
-                             std::vector<LRef>& refs, const TypeSpec*) {
+                             std::vector<LRef>& refs, const TypeSpec*, bool formatChecked) {
     std::vector<Symbol*> opargs;
     std::string rw;
     Symbol* result = nullptr;
@@ -1026,8 +1069,9 @@ Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symb
         bool out = i < fn->params.size() && fn->params[i].output;
         if (i >= fn->params.size()) {
             if (a->type.is_structure_based()) {
-                error(e, "struct '" + a->type.structspec()->name().string() +
-                             "' is not a valid argument");
+                if (!formatChecked)
+                    error(e, "struct '" + a->type.structspec()->name().string() +
+                                 "' is not a valid argument");
                 continue;
             }
             // Optional texture/attribute arguments named "alpha" etc. are written by the op.
@@ -1051,7 +1095,11 @@ Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symb
         rw += out ? 'w' : 'r';
     }
     m_curLine = e->line;
-    emit(fn->isClosure ? "closure" : fn->opname.empty() ? fn->name : fn->opname, opargs, rw);
+    const std::string opname = fn->isClosure       ? std::string("closure")
+                               : fn->opname.empty() ? fn->name
+                                                    : fn->opname;
+    int op = emit(opname, opargs, rw);
+    (*m_ops)[op].argDerivs = derivativeArgs(opname, opargs);
     for (auto& wb : writeBacks) store(refs[wb.first], wb.second, e);
     return result ? result : voidValue();
 }
