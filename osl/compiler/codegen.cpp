@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <filesystem>
 
 namespace OSL::pvt {
 
@@ -150,13 +151,39 @@ std::string CodeGen::scopedName(const std::string& name) {
     return "___" + std::to_string(m_scopes.back().id) + "_" + name;
 }
 
+// Names are unique within a scope. The shader's parameters and the top level of its body share
+// the global scope with the shader globals and every function, as in oslc: there a name that is
+// already a function is an error, except for a parameter, which only gets a warning.
 void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
-    auto& vars = m_scopes.back().vars;
-    if (vars.count(name)) {
-        error(at, "'" + name + "' already declared in this scope");
+    Scope& scope = m_scopes.back();
+    auto previousAt = [&](const std::string& file, int line) {
+        return "\n\t\tprevious declaration was at " +
+               std::filesystem::path(file).filename().string() + ":" + std::to_string(line);
+    };
+    // Built piecewise: GCC 12 falsely reports an overlapping copy for "\"" + name.
+    std::string clash(1, '"');
+    clash += name;
+    clash += "\" already declared in this scope";
+    if (scope.vars.count(name)) {
+        const Node* prior = scope.declaredAt[name];
+        error(at, prior ? clash + previousAt(fileOf(prior), prior->line) : clash);
         return;
     }
-    vars[name] = s;
+    if (int(m_scopes.size()) - 1 == m_shaderScopeDepth) {
+        auto fn = m_functions.find(name);
+        if (isGlobalName(name)) {
+            error(at, clash);
+        } else if (fn != m_functions.end() && !fn->second.empty()) {
+            const FunctionSymbol* last = fn->second.back().get();
+            std::string msg = clash + previousAt(last->file, last->line);
+            if (s->symtype == SymTypeParam || s->symtype == SymTypeOutputParam)
+                warning(at, msg);
+            else
+                error(at, msg);
+        }
+    }
+    scope.vars[name] = s;
+    scope.declaredAt[name] = at;
 }
 
 Symbol* CodeGen::lookupVar(const std::string& name) {
@@ -167,7 +194,7 @@ Symbol* CodeGen::lookupVar(const std::string& name) {
     return global(name);
 }
 
-Symbol* CodeGen::global(const std::string& name) {
+static const std::map<std::string, TypeDesc>& shaderGlobals() {
     static const std::map<std::string, TypeDesc> globals = {
         {"P", TypeDesc::TypePoint},     {"I", TypeDesc::TypeVector},
         {"N", TypeDesc::TypeNormal},    {"Ng", TypeDesc::TypeNormal},
@@ -176,6 +203,15 @@ Symbol* CodeGen::global(const std::string& name) {
         {"Ps", TypeDesc::TypePoint},    {"time", TypeDesc::TypeFloat},
         {"dtime", TypeDesc::TypeFloat}, {"dPdtime", TypeDesc::TypeVector},
         {"Ci", TypeDesc::TypeColor}};
+    return globals;
+}
+
+bool CodeGen::isGlobalName(const std::string& name) const {
+    return shaderGlobals().count(name) != 0;
+}
+
+Symbol* CodeGen::global(const std::string& name) {
+    const auto& globals = shaderGlobals();
     auto it = globals.find(name);
     if (it == globals.end()) return nullptr;
     auto g = m_globals.find(name);
@@ -275,11 +311,14 @@ void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
     int savedFile = m_curFile, savedLine = m_curLine;
     m_ops = &scratch;
     m_checkOnly = true;
+    std::vector<const Node*> paramNodes;
+    for (const auto& p : n->kids)
+        if (p->typeName.name != "...") paramNodes.push_back(p.get());
     pushScope();
     for (size_t i = 0; i < fn->params.size(); ++i) {
         Symbol* p = newStructSymbol(fn->params[i].name, fn->params[i].type, SymTypeParam);
         if (fn->params[i].output) p->symtype = SymTypeOutputParam;
-        declare(fn->params[i].name, p, n);
+        declare(fn->params[i].name, p, i < paramNodes.size() ? paramNodes[i] : n);
     }
     m_currentFunction = fn;
     m_sawReturn = false;

@@ -39,6 +39,7 @@ private:
     };
     struct Scope {
         std::map<std::string, Symbol*> vars;
+        std::map<std::string, const Node*> declaredAt;
         int id = 0;
     };
     struct InlineFrame {
@@ -68,6 +69,7 @@ private:
                      const std::vector<std::string>& sv);
     Symbol* lookupVar(const std::string& name);
     Symbol* global(const std::string& name);
+    bool isGlobalName(const std::string& name) const;
     void declare(const std::string& name, Symbol* s, const Node* at);
     std::string scopedName(const std::string& name);
     void pushScope();
