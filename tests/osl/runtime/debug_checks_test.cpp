@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include <limits>
+#include <vector>
 
 using namespace OSL;
 using namespace runtime_test;
@@ -46,30 +47,17 @@ code ___main___
 	end
 )";
 
-class DebugChecks : public ::testing::Test {
+class DebugChecks : public ShadingFixture {
 protected:
-    DebugChecks() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("uninit", kUninitOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("scale", kScaleOso));
-    }
+    DebugChecks() : ShadingFixture({{"uninit", kUninitOso}, {"scale", kScaleOso}}) {}
 
     // Runs a one-layer group once and returns its "out".
     float runOnce(const char* shader, const float* x = nullptr) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("dbg");
-        if (x) ss.Parameter(*g, "x", TypeFloat, x);
-        EXPECT_TRUE(ss.Shader(*g, "surface", shader, "l"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        ShadingContext* ctx = ss.get_context();
-        ShaderGlobals sg = globalsAt(0.5f, 0.5f);
-        EXPECT_TRUE(ss.execute(*ctx, *g, 0, sg));
-        const void* p = ss.symbol_address(*ctx, ss.find_symbol(*g, ustring("out")));
-        const float out = p ? *static_cast<const float*>(p) : -1.0f;
-        ss.release_context(ctx);
-        return out;
+        std::vector<Param> params;
+        if (x) params.push_back({"x", TypeFloat, x});
+        ShaderGroupRef g = single(shader, params, "l", "dbg");
+        return run<float>(*g, "out");
     }
-
-    CollectingHandler handler;
-    ShadingSystem ss;
 };
 
 TEST_F(DebugChecks, UninitializedReadsAreReportedWithTheirPlace) {

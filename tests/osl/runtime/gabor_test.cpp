@@ -336,36 +336,18 @@ code ___main___
 	end
 )";
 
-class GaborOpTest : public ::testing::Test {
+class GaborOpTest : public ShadingFixture {
 protected:
-    GaborOpTest() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("gabortest", kGaborOso));
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~GaborOpTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
+    GaborOpTest() : ShadingFixture({{"gabortest", kGaborOso}}) {}
+
+    // The floats of `symbol` after shading `g` once at (u, v).
     const float* run(ShaderGroup& g, const char* symbol, float u, float v) {
-        ShaderGlobals sg = globalsAt(u, v);
-        EXPECT_TRUE(ss.execute(*ctx, g, 0, sg));
-        const ShaderSymbol* sym = ss.find_symbol(g, ustring(symbol));
-        EXPECT_NE(sym, nullptr);
-        return sym ? static_cast<const float*>(ss.symbol_address(*ctx, sym)) : nullptr;
+        EXPECT_TRUE(execute(g, u, v));
+        return value<float>(g, symbol);
     }
     ShaderGroupRef group(int aniso, float bw) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
-        ss.Parameter(*g, "aniso", TypeInt, &aniso);
-        ss.Parameter(*g, "bw", TypeFloat, &bw);
-        EXPECT_TRUE(ss.Shader(*g, "surface", "gabortest", "l"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        return g;
+        return single("gabortest", {{"aniso", TypeInt, &aniso}, {"bw", TypeFloat, &bw}});
     }
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
 };
 
 TEST_F(GaborOpTest, OpMatchesTheLibraryWithItsOptions) {

@@ -37,17 +37,14 @@ code ___main___
 	end
 )";
 
-class GroupQuery : public ::testing::Test {
+class GroupQuery : public ShadingFixture {
 protected:
-    GroupQuery() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("add", kAddOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("upstream", kUpstreamOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("downstream", kDownstreamOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("facing", kFacingOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("geom", kGeomOso));
-        ctx = ss.get_context();
-    }
-    ~GroupQuery() override { ss.release_context(ctx); }
+    GroupQuery()
+        : ShadingFixture({{"add", kAddOso},
+                          {"upstream", kUpstreamOso},
+                          {"downstream", kDownstreamOso},
+                          {"facing", kFacingOso},
+                          {"geom", kGeomOso}}) {}
 
     // upstream "up" feeding downstream "down".x
     ShaderGroupRef chain() {
@@ -57,18 +54,11 @@ protected:
         EXPECT_TRUE(ss.ConnectShaders(*g, "up", "out", "down", "x"));
         return g;
     }
-
-    CollectingHandler handler;
-    ShadingSystem ss;
-    ShadingContext* ctx = nullptr;
 };
 
 TEST_F(GroupQuery, OslQueryDescribesALayerWithItsInstanceValues) {
-    ShaderGroupRef g = ss.ShaderGroupBegin("q");
     const float b = 7.0f;
-    ss.Parameter(*g, "b", TypeFloat, &b);
-    ASSERT_TRUE(ss.Shader(*g, "surface", "add", "first"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
+    ShaderGroupRef g = single("add", {{"b", TypeFloat, &b}});
     OSLQuery q(g.get(), 0);
     EXPECT_EQ(q.shadername(), "add");
     ASSERT_EQ(q.nparams(), 3u);
@@ -88,9 +78,7 @@ TEST_F(GroupQuery, OslQueryDescribesALayerWithItsInstanceValues) {
 }
 
 TEST_F(GroupQuery, GlobalsNeededAreSortedAndIncludeWhatBackfacingReads) {
-    ShaderGroupRef g = ss.ShaderGroupBegin("f");
-    ASSERT_TRUE(ss.Shader(*g, "surface", "facing", "l"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
+    ShaderGroupRef g = single("facing");
     int n = 0;
     ASSERT_TRUE(ss.getattribute(g.get(), "num_globals_needed", TypeInt, &n));
     ASSERT_EQ(n, 2); // v is declared but never used
@@ -122,25 +110,18 @@ TEST_F(GroupQuery, GetSymbolReadsTheContextsLatestValues) {
 }
 
 TEST_F(GroupQuery, ReParameterChangesOnlyGeometricParameters) {
-    ShaderGroupRef g = ss.ShaderGroupBegin("re");
-    ASSERT_TRUE(ss.Shader(*g, "surface", "geom", "l"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
-    ShaderGlobals sg = globalsAt(0.5f, 0.5f);
-    const ShaderSymbol* out = ss.find_symbol(*g, ustring("out"));
-    ASSERT_TRUE(ss.execute(*ctx, *g, 0, sg));
-    EXPECT_FLOAT_EQ(*static_cast<const float*>(ss.symbol_address(*ctx, out)), 1.0f);
+    ShaderGroupRef g = single("geom");
+    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 1.0f);
     const float k = 10.0f;
-    ASSERT_TRUE(ss.ReParameter(*g, "l", "k", TypeFloat, &k));
-    ASSERT_TRUE(ss.execute(*ctx, *g, 0, sg));
-    EXPECT_FLOAT_EQ(*static_cast<const float*>(ss.symbol_address(*ctx, out)), 5.0f);
+    ASSERT_TRUE(ss.ReParameter(*g, "layer", "k", TypeFloat, &k));
+    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 5.0f);
     // A constant parameter, a wrong type or an unknown name leave the group as it was.
-    EXPECT_FALSE(ss.ReParameter(*g, "l", "fixed", TypeFloat, &k));
+    EXPECT_FALSE(ss.ReParameter(*g, "layer", "fixed", TypeFloat, &k));
     const int ik = 3;
-    EXPECT_FALSE(ss.ReParameter(*g, "l", "k", TypeInt, &ik));
-    EXPECT_FALSE(ss.ReParameter(*g, "l", "nosuch", TypeFloat, &k));
+    EXPECT_FALSE(ss.ReParameter(*g, "layer", "k", TypeInt, &ik));
+    EXPECT_FALSE(ss.ReParameter(*g, "layer", "nosuch", TypeFloat, &k));
     EXPECT_FALSE(ss.ReParameter(*g, "nolayer", "k", TypeFloat, &k));
-    ASSERT_TRUE(ss.execute(*ctx, *g, 0, sg));
-    EXPECT_FLOAT_EQ(*static_cast<const float*>(ss.symbol_address(*ctx, out)), 5.0f);
+    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 5.0f);
 }
 
 TEST_F(GroupQuery, LayersRunOneByOneWithTheirTrace) {
@@ -181,11 +162,7 @@ TEST_F(GroupQuery, AGroupDescriptionThatFailsNamesTheStatement) {
     ShaderGroupRef ok = ss.ShaderGroupBegin("good", "surface", "param float b 5 ; shader add a ;");
     ASSERT_NE(ok, nullptr);
     ASSERT_TRUE(ss.ShaderGroupEnd(*ok));
-    ShaderGlobals sg = globalsAt(0.5f, 0.5f);
-    ASSERT_TRUE(ss.execute(*ctx, *ok, 0, sg));
-    const void* p = ss.symbol_address(*ctx, ss.find_symbol(*ok, ustring("out")));
-    ASSERT_NE(p, nullptr);
-    EXPECT_FLOAT_EQ(*static_cast<const float*>(p), 6.0f);
+    EXPECT_FLOAT_EQ(run<float>(*ok, "out"), 6.0f);
 }
 
 } // namespace

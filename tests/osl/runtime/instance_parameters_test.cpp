@@ -27,30 +27,9 @@ code ___main___
 	end
 )";
 
-class InstanceParametersTest : public ::testing::Test {
+class InstanceParametersTest : public ShadingFixture {
 protected:
-    InstanceParametersTest() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("params", kParamsOso));
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~InstanceParametersTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
-    template <typename T>
-    T output(ShaderGroup& g, const char* name) {
-        ShaderGlobals sg = globalsAt(0.5f, 0.5f);
-        EXPECT_TRUE(ss.execute(*ctx, g, 0, sg));
-        const ShaderSymbol* sym = ss.find_symbol(g, ustring(name));
-        EXPECT_NE(sym, nullptr) << name;
-        return sym ? *static_cast<const T*>(ss.symbol_address(*ctx, sym)) : T();
-    }
-
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
+    InstanceParametersTest() : ShadingFixture({{"params", kParamsOso}}) {}
 };
 
 TEST_F(InstanceParametersTest, ValuesWaitPastAShaderThatCannotBeFound) {
@@ -61,7 +40,7 @@ TEST_F(InstanceParametersTest, ValuesWaitPastAShaderThatCannotBeFound) {
     EXPECT_NE(handler.errors.find("Could not find shader \"no_such_shader\""), std::string::npos);
     ASSERT_TRUE(ss.Shader(*g, "surface", "params", "l"));
     ASSERT_TRUE(ss.ShaderGroupEnd(*g));
-    EXPECT_FLOAT_EQ(output<float>(*g, "out"), 12.0f);
+    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 12.0f);
 }
 
 TEST_F(InstanceParametersTest, ValuesAreUsedOnceByTheShaderThatLoads) {
@@ -72,40 +51,31 @@ TEST_F(InstanceParametersTest, ValuesAreUsedOnceByTheShaderThatLoads) {
     ASSERT_TRUE(ss.Shader(*g, "surface", "params", "second"));
     ASSERT_TRUE(ss.ShaderGroupEnd(*g));
     // Only the last layer runs; it has its defaults.
-    EXPECT_FLOAT_EQ(output<float>(*g, "second.out"), 3.0f);
+    EXPECT_FLOAT_EQ(run<float>(*g, "second.out"), 3.0f);
 }
 
 TEST_F(InstanceParametersTest, OneFloatFillsATripleAndAnyTripleBindsToAColour) {
-    ShaderGroupRef g = ss.ShaderGroupBegin("");
     const float half = 0.5f;
-    ss.Parameter(*g, "c", TypeFloat, &half);
-    ASSERT_TRUE(ss.Shader(*g, "surface", "params", "l"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
-    EXPECT_EQ(output<Vec3>(*g, "tint"), Vec3(0.5f));
+    ShaderGroupRef g = single("params", {{"c", TypeFloat, &half}});
+    EXPECT_EQ(run<Vec3>(*g, "tint"), Vec3(0.5f));
 
-    ShaderGroupRef g2 = ss.ShaderGroupBegin("");
     const Vec3 v(1.0f, 2.0f, 3.0f);
-    ss.Parameter(*g2, "c", TypeVector, &v);
-    ASSERT_TRUE(ss.Shader(*g2, "surface", "params", "l"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g2));
-    EXPECT_EQ(output<Vec3>(*g2, "tint"), v);
+    ShaderGroupRef g2 = single("params", {{"c", TypeVector, &v}});
+    EXPECT_EQ(run<Vec3>(*g2, "tint"), v);
     EXPECT_EQ(handler.warnings, "");
 }
 
 TEST_F(InstanceParametersTest, NumbersOfTheWrongTypeAreReportedAndSkipped) {
-    ShaderGroupRef g = ss.ShaderGroupBegin("");
     const int ten = 10;
     const float half = 0.5f;
     const ustring s("text");
     const float three[3] = {1, 2, 3};
-    ss.Parameter(*g, "a", TypeInt, &ten);
-    ss.Parameter(*g, "n", TypeFloat, &half);
-    ss.Parameter(*g, "b", TypeString, &s);
-    ss.Parameter(*g, "c", TypeDesc(TypeDesc::FLOAT, 3), three);
-    ASSERT_TRUE(ss.Shader(*g, "surface", "params", "l"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
-    EXPECT_FLOAT_EQ(output<float>(*g, "out"), 3.0f);
-    EXPECT_EQ(output<Vec3>(*g, "tint"), Vec3(0.0f));
+    ShaderGroupRef g = single("params", {{"a", TypeInt, &ten},
+                                         {"n", TypeFloat, &half},
+                                         {"b", TypeString, &s},
+                                         {"c", TypeDesc(TypeDesc::FLOAT, 3), three}});
+    EXPECT_FLOAT_EQ(run<float>(*g, "out"), 3.0f);
+    EXPECT_EQ(run<Vec3>(*g, "tint"), Vec3(0.0f));
     EXPECT_EQ(handler.warnings,
               "attempting to set parameter with wrong type: a (expected 'float', received 'int')\n"
               "attempting to set parameter with wrong type: n (expected 'int', received 'float')\n"

@@ -365,45 +365,16 @@ code ___main___
 	end
 )";
 
-class NoiseShadingTest : public ::testing::Test {
+class NoiseShadingTest : public ShadingFixture {
 protected:
-    NoiseShadingTest() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("noisy", kNoiseOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("badname", kBadNameOso));
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~NoiseShadingTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
+    NoiseShadingTest() : ShadingFixture({{"noisy", kNoiseOso}, {"badname", kBadNameOso}}) {}
 
+    // A group of `shader`, with the noise named `kind` when one is given.
     ShaderGroupRef group(const char* shader, const char* kind = nullptr) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
-        if (kind) {
-            const ustring k(kind);
-            ss.Parameter(*g, "kind", TypeDesc::STRING, &k);
-        }
-        EXPECT_TRUE(ss.Shader(*g, "surface", shader, "layer"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        return g;
+        const ustring k(kind ? kind : "");
+        return single(shader, kind ? std::vector<Param>{{"kind", TypeDesc::STRING, &k}}
+                                   : std::vector<Param>{});
     }
-
-    bool execute(ShaderGroup& g, float u, float v) {
-        ShaderGlobals sg = globalsAt(u, v);
-        return ss.execute(*ctx, g, 0, sg);
-    }
-
-    const float* value(ShaderGroup& g, const char* name) {
-        const ShaderSymbol* sym = ss.find_symbol(g, ustring(name));
-        EXPECT_NE(sym, nullptr) << name;
-        return sym ? static_cast<const float*>(ss.symbol_address(*ctx, sym)) : nullptr;
-    }
-
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
 };
 
 TEST_F(NoiseShadingTest, OpsAgreeWithTheNoiseFunctions) {
@@ -416,11 +387,11 @@ TEST_F(NoiseShadingTest, OpsAgreeWithTheNoiseFunctions) {
     noise::cellNoise(cell, 3, p, 3);
     const float period[3] = {2, 2, 2};
     noise::perlin(&periodic, 1, p, 3, period);
-    EXPECT_EQ(*value(*g, "byname"), signedPerlin);
-    EXPECT_EQ(*value(*g, "direct"), signedPerlin);
-    EXPECT_EQ(*value(*g, "opt"), signedPerlin);
-    EXPECT_EQ(*value(*g, "per"), 0.5f * (periodic + 1.0f));
-    for (int c = 0; c < 3; ++c) EXPECT_EQ(value(*g, "cell")[c], cell[c]);
+    EXPECT_EQ(*value<float>(*g, "byname"), signedPerlin);
+    EXPECT_EQ(*value<float>(*g, "direct"), signedPerlin);
+    EXPECT_EQ(*value<float>(*g, "opt"), signedPerlin);
+    EXPECT_EQ(*value<float>(*g, "per"), 0.5f * (periodic + 1.0f));
+    for (int c = 0; c < 3; ++c) EXPECT_EQ(value<float>(*g, "cell")[c], cell[c]);
     EXPECT_TRUE(handler.errors.empty()) << handler.errors;
 }
 
@@ -435,9 +406,9 @@ TEST_F(NoiseShadingTest, DerivativesFlowThroughNoiseButNotCellNoise) {
     noise::perlin(&lo, 1, a, 3, nullptr);
     noise::perlin(&hi, 1, b, 3, nullptr);
     const float expected = 0.1f * 0.5f * (hi - lo) / (2 * h);
-    EXPECT_NEAR(*value(*g, "dn"), expected, 1e-3f + 1e-2f * std::fabs(expected));
-    EXPECT_NE(*value(*g, "dn"), 0.0f);
-    EXPECT_EQ(*value(*g, "dcell"), 0.0f);
+    EXPECT_NEAR(*value<float>(*g, "dn"), expected, 1e-3f + 1e-2f * std::fabs(expected));
+    EXPECT_NE(*value<float>(*g, "dn"), 0.0f);
+    EXPECT_EQ(*value<float>(*g, "dcell"), 0.0f);
 }
 
 TEST_F(NoiseShadingTest, NameChosenWhileShadingSelectsEachType) {
@@ -454,7 +425,7 @@ TEST_F(NoiseShadingTest, NameChosenWhileShadingSelectsEachType) {
     for (const auto& [kind, expected] : cases) {
         ShaderGroupRef g = group("noisy", kind);
         ASSERT_TRUE(execute(*g, u, v));
-        EXPECT_EQ(*value(*g, "byname"), expected) << kind;
+        EXPECT_EQ(*value<float>(*g, "byname"), expected) << kind;
     }
     EXPECT_TRUE(handler.errors.empty()) << handler.errors;
 }
@@ -464,7 +435,7 @@ TEST_F(NoiseShadingTest, UnknownNameWhileShadingIsReportedAndGivesZero) {
     execute(*g, 0.5f, 0.5f);
     EXPECT_NE(handler.errors.find("Unknown noise type \"wobbly\""), std::string::npos)
         << handler.errors;
-    EXPECT_EQ(*value(*g, "byname"), 0.0f);
+    EXPECT_EQ(*value<float>(*g, "byname"), 0.0f);
 }
 
 TEST_F(NoiseShadingTest, UnknownConstantNameFailsTheGroup) {

@@ -173,54 +173,35 @@ code ___main___
 	end
 )";
 
-class OptimizerTest : public ::testing::Test {
+class OptimizerTest : public ShadingFixture {
 protected:
-    OptimizerTest() : ss(nullptr, nullptr, &handler) {
-        const std::pair<const char*, const char*> shaders[] = {
-            {"fold", kFoldOso},         {"guarded", kGuardedOso},
-            {"looped", kLoopedOso},     {"readfirst", kReadFirstOso},
-            {"noisy", kNoisyOso},       {"warner", kWarnOso},
-            {"add", kAddOso},           {"loop", kLoopOso},
-            {"derivs", kDerivsOso},     {"printer", kPrintOso},
-            {"upstream", kUpstreamOso}, {"downstream", kDownstreamOso},
-            {"copy", kCopyOso},         {"copyguarded", kCopyGuardedOso}};
-        for (const auto& s : shaders)
-            EXPECT_TRUE(ss.LoadMemoryCompiledShader(s.first, s.second))
-                << s.first << handler.errors;
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~OptimizerTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
+    OptimizerTest()
+        : ShadingFixture({{"fold", kFoldOso},
+                          {"guarded", kGuardedOso},
+                          {"looped", kLoopedOso},
+                          {"readfirst", kReadFirstOso},
+                          {"noisy", kNoisyOso},
+                          {"warner", kWarnOso},
+                          {"add", kAddOso},
+                          {"loop", kLoopOso},
+                          {"derivs", kDerivsOso},
+                          {"printer", kPrintOso},
+                          {"upstream", kUpstreamOso},
+                          {"downstream", kDownstreamOso},
+                          {"copy", kCopyOso},
+                          {"copyguarded", kCopyGuardedOso}}) {}
 
-    ShaderGroupRef single(const char* shader, int optimize = 2) {
+    // A one-layer group built at the given optimisation level.
+    ShaderGroupRef single(const char* shader, int optimize = 2,
+                          const std::vector<Param>& params = {}) {
         ss.attribute("optimize", optimize);
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
-        EXPECT_TRUE(ss.Shader(*g, "surface", shader, "layer"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        return g;
-    }
-    template <typename T>
-    T run(ShaderGroup& g, const char* symbol, float u = 0.5f) {
-        ShaderGlobals sg = globalsAt(u, 0.25f);
-        EXPECT_TRUE(ss.execute(*ctx, g, 0, sg));
-        const ShaderSymbol* sym = ss.find_symbol(g, ustring(symbol));
-        EXPECT_NE(sym, nullptr) << symbol;
-        const void* p = sym ? ss.symbol_address(*ctx, sym) : nullptr;
-        return p ? *static_cast<const T*>(p) : T();
+        return ShadingFixture::single(shader, params);
     }
     int stat(ShaderGroup& g, const char* name) {
         int v = -1;
         EXPECT_TRUE(ss.getattribute(&g, name, TypeInt, &v)) << name;
         return v;
     }
-
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
 };
 
 TEST_F(OptimizerTest, FoldsArithmeticOnFixedParameters) {
@@ -239,23 +220,15 @@ TEST_F(OptimizerTest, FoldsArithmeticOnFixedParameters) {
 }
 
 TEST_F(OptimizerTest, InstanceValuesAreFoldedToo) {
-    ss.attribute("optimize", 2);
-    ShaderGroupRef g = ss.ShaderGroupBegin("");
     const float a = 10.0f;
-    ss.Parameter(*g, "a", TypeFloat, &a);
-    ASSERT_TRUE(ss.Shader(*g, "surface", "fold", "layer"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
+    ShaderGroupRef g = single("fold", 2, {{"a", TypeFloat, &a}});
     EXPECT_FLOAT_EQ(run<float>(*g, "out"), 21.0f);
     EXPECT_EQ(run<int>(*g, "fixed"), 1);
 }
 
 TEST_F(OptimizerTest, GeometricParametersAreNotFixed) {
-    ss.attribute("optimize", 2);
-    ShaderGroupRef g = ss.ShaderGroupBegin("");
-    float a = 4.0f;
-    ss.Parameter(*g, "a", TypeFloat, &a, false);
-    ASSERT_TRUE(ss.Shader(*g, "surface", "fold", "layer"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*g));
+    const float a = 4.0f;
+    ShaderGroupRef g = single("fold", 2, {{"a", TypeFloat, &a, false}});
     EXPECT_EQ(run<int>(*g, "fixed"), 0);
     EXPECT_FLOAT_EQ(run<float>(*g, "out"), 9.0f);
     EXPECT_EQ(stat(*g, "stat:ops_folded"), 0);
@@ -265,12 +238,8 @@ TEST_F(OptimizerTest, ValuesWrittenUnderAConditionAreNotFixed) {
     ShaderGroupRef g = single("guarded");
     EXPECT_EQ(run<int>(*g, "fixed"), 0);
     EXPECT_FLOAT_EQ(run<float>(*g, "out"), 6.0f);
-    ss.attribute("optimize", 2);
-    ShaderGroupRef off = ss.ShaderGroupBegin("");
     const int flag = 0;
-    ss.Parameter(*off, "flag", TypeInt, &flag);
-    ASSERT_TRUE(ss.Shader(*off, "surface", "guarded", "layer"));
-    ASSERT_TRUE(ss.ShaderGroupEnd(*off));
+    ShaderGroupRef off = single("guarded", 2, {{"flag", TypeInt, &flag}});
     EXPECT_FLOAT_EQ(run<float>(*off, "out"), 0.0f);
 }
 

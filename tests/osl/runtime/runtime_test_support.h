@@ -1,12 +1,17 @@
-// Helpers shared by the shading-system tests: OSO snippets, a message-collecting error handler
-// and a one-call way to shade one point.
+// Helpers shared by the shading-system tests: OSO snippets, a message-collecting error handler,
+// and a fixture that builds one-layer groups, shades single points and reads back the results.
 #pragma once
 
 #include <OSL/oslexec.h>
 
+#include <gtest/gtest.h>
+
 #include <cstring>
+#include <initializer_list>
+#include <memory>
 #include <mutex>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace runtime_test {
@@ -40,6 +45,73 @@ inline OSL::ShaderGlobals globalsAt(float u, float v) {
     sg.N = sg.Ng = OSL::Vec3(0.0f, 0.0f, 1.0f);
     return sg;
 }
+
+// An instance value given before a layer's shader; `lockgeom` false lets it change per point.
+struct Param {
+    const char* name;
+    OSL::TypeDesc type;
+    const void* value;
+    bool lockgeom = true;
+};
+
+// A shading system reporting to `handler` (and asking `renderer`, when given), the shaders it
+// was given loaded, and one context to shade with: the base of the tests' fixtures.
+class ShadingFixture : public ::testing::Test {
+protected:
+    using Shaders = std::initializer_list<std::pair<const char*, const char*>>;
+
+    explicit ShadingFixture(Shaders shaders,
+                            std::unique_ptr<OSL::RendererServices> services = nullptr)
+        : renderer(std::move(services)), ss(renderer.get(), nullptr, &handler) {
+        for (const auto& [name, oso] : shaders)
+            EXPECT_TRUE(ss.LoadMemoryCompiledShader(name, oso)) << name << handler.errors;
+        thread = ss.create_thread_info();
+        ctx = ss.get_context(thread);
+    }
+    ~ShadingFixture() override {
+        ss.release_context(ctx);
+        ss.destroy_thread_info(thread);
+    }
+
+    // A group of one layer running `shader` with the given instance values.
+    OSL::ShaderGroupRef single(const char* shader, const std::vector<Param>& params = {},
+                               const char* layer = "layer", const char* group = "") {
+        OSL::ShaderGroupRef g = ss.ShaderGroupBegin(group);
+        for (const Param& p : params) ss.Parameter(*g, p.name, p.type, p.value, p.lockgeom);
+        EXPECT_TRUE(ss.Shader(*g, "surface", shader, layer));
+        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
+        return g;
+    }
+
+    // Shades `g` once with globalsAt(u, v).
+    bool execute(OSL::ShaderGroup& g, float u = 0.5f, float v = 0.5f) {
+        OSL::ShaderGlobals sg = globalsAt(u, v);
+        return ss.execute(*ctx, g, 0, sg);
+    }
+
+    // Where the context holds `symbol` of `g`; null, and a failure, when there is no such symbol.
+    template <typename T>
+    const T* value(OSL::ShaderGroup& g, const char* symbol) {
+        const OSL::ShaderSymbol* sym = ss.find_symbol(g, OSL::ustring(symbol));
+        EXPECT_NE(sym, nullptr) << symbol;
+        return sym ? static_cast<const T*>(ss.symbol_address(*ctx, sym)) : nullptr;
+    }
+
+    // Shades `g` once at (u, v) and returns the value of `symbol` (T() when it has none).
+    template <typename T>
+    T run(OSL::ShaderGroup& g, const char* symbol, float u = 0.5f, float v = 0.5f) {
+        EXPECT_TRUE(execute(g, u, v));
+        const T* p = value<T>(g, symbol);
+        EXPECT_NE(p, nullptr) << symbol;
+        return p ? *p : T();
+    }
+
+    std::unique_ptr<OSL::RendererServices> renderer;
+    CollectingHandler handler;
+    OSL::ShadingSystem ss;
+    OSL::PerThreadInfo* thread = nullptr;
+    OSL::ShadingContext* ctx = nullptr;
+};
 
 // out = a + b, with a = 1 and b = 2 by default.
 inline const char* kAddOso = R"(OpenShadingLanguage 1.00

@@ -13,47 +13,15 @@ using namespace runtime_test;
 
 namespace {
 
-class ShadingSystemTest : public ::testing::Test {
+class ShadingSystemTest : public ShadingFixture {
 protected:
-    ShadingSystemTest() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("add", kAddOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("upstream", kUpstreamOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("downstream", kDownstreamOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("derivs", kDerivsOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("loop", kLoopOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("printer", kPrintOso));
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~ShadingSystemTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
-
-    // Value of a float (or int) symbol after running the group once at (u, v).
-    template <typename T>
-    T run(ShaderGroup& g, const char* symbol, float u = 0.5f, float v = 0.5f) {
-        ShaderGlobals sg = globalsAt(u, v);
-        EXPECT_TRUE(ss.execute(*ctx, g, 0, sg));
-        const ShaderSymbol* sym = ss.find_symbol(g, ustring(symbol));
-        EXPECT_NE(sym, nullptr) << symbol;
-        if (!sym) return T();
-        const void* p = ss.symbol_address(*ctx, sym);
-        EXPECT_NE(p, nullptr);
-        return p ? *static_cast<const T*>(p) : T();
-    }
-
-    ShaderGroupRef single(const char* shader) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
-        EXPECT_TRUE(ss.Shader(*g, "surface", shader, "layer"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        return g;
-    }
-
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
+    ShadingSystemTest()
+        : ShadingFixture({{"add", kAddOso},
+                          {"upstream", kUpstreamOso},
+                          {"downstream", kDownstreamOso},
+                          {"derivs", kDerivsOso},
+                          {"loop", kLoopOso},
+                          {"printer", kPrintOso}}) {}
 };
 
 TEST_F(ShadingSystemTest, RunsWithDefaultParameterValues) {
@@ -72,8 +40,9 @@ TEST_F(ShadingSystemTest, InstanceValuesReplaceDefaultsAndWrongTypesAreSkipped) 
     ASSERT_TRUE(ss.ShaderGroupEnd(*g));
     // An int is not converted for a float parameter: b keeps its default of 2.
     EXPECT_FLOAT_EQ(run<float>(*g, "out"), 7.0f);
-    EXPECT_EQ(handler.warnings,
-              "attempting to set parameter with wrong type: b (expected 'float', received 'int')\n");
+    EXPECT_EQ(
+        handler.warnings,
+        "attempting to set parameter with wrong type: b (expected 'float', received 'int')\n");
 }
 
 TEST_F(ShadingSystemTest, UnknownShaderIsReportedAndFails) {

@@ -229,35 +229,17 @@ code ___main___
 	end
 )";
 
-class SplineOpTest : public ::testing::Test {
+class SplineOpTest : public ShadingFixture {
 protected:
-    SplineOpTest() : ss(nullptr, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("splinecount", kSplineCountOso));
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~SplineOpTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
+    SplineOpTest() : ShadingFixture({{"splinecount", kSplineCountOso}}) {}
+
     float run(int count, float x, const char* basis, const char* symbol) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
-        ss.Parameter(*g, "count", TypeInt, &count);
-        ss.Parameter(*g, "x", TypeFloat, &x);
         const ustring b(basis);
-        ss.Parameter(*g, "basis", TypeString, &b);
-        EXPECT_TRUE(ss.Shader(*g, "surface", "splinecount", "l"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        ShaderGlobals sg = globalsAt(0.5f, 0.5f);
-        EXPECT_TRUE(ss.execute(*ctx, *g, 0, sg));
-        const ShaderSymbol* sym = ss.find_symbol(*g, ustring(symbol));
-        EXPECT_NE(sym, nullptr);
-        return sym ? *static_cast<const float*>(ss.symbol_address(*ctx, sym)) : -1.0f;
+        ShaderGroupRef g =
+            single("splinecount",
+                   {{"count", TypeInt, &count}, {"x", TypeFloat, &x}, {"basis", TypeString, &b}});
+        return ShadingFixture::run<float>(*g, symbol);
     }
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
 };
 
 TEST_F(SplineOpTest, ExplicitKnotCountUsesOnlyThatManyKnots) {

@@ -15,6 +15,8 @@
 #include <filesystem>
 #include <string>
 #include <unistd.h>
+#include <utility>
+#include <vector>
 
 using namespace OSL;
 using namespace runtime_test;
@@ -192,7 +194,7 @@ std::string uniqueName(const std::string& stem) {
     return stem + "_" + std::to_string(getpid()) + "_" + std::to_string(counter++);
 }
 
-class TextureTest : public ::testing::Test {
+class TextureTest : public ShadingFixture {
 protected:
     static void SetUpTestSuite() {
         dir = std::filesystem::temp_directory_path() / uniqueName("tessel_texture_test");
@@ -227,62 +229,38 @@ protected:
         ASSERT_TRUE(buf.write(file));
     }
 
-    TextureTest() : ss(nullptr, nullptr, &handler) {
-        for (auto [name, oso] : {std::pair{"lookup", kLookupOso},
-                                 {"plain", kPlainOso},
-                                 {"missing", kMissingOso},
-                                 {"texderivs", kDerivsOso},
-                                 {"badoption", kBadOptionOso},
-                                 {"env", kEnvOso},
-                                 {"info", kInfoOso}})
-            EXPECT_TRUE(ss.LoadMemoryCompiledShader(name, oso)) << name;
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~TextureTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
+    TextureTest()
+        : ShadingFixture({{"lookup", kLookupOso},
+                          {"plain", kPlainOso},
+                          {"missing", kMissingOso},
+                          {"texderivs", kDerivsOso},
+                          {"badoption", kBadOptionOso},
+                          {"env", kEnvOso},
+                          {"info", kInfoOso}}) {}
 
-    // A group of one shader with the given string and float parameters.
+    // A group of one shader with the given string, float and int parameters.
     ShaderGroupRef group(const char* shader,
                          std::initializer_list<std::pair<const char*, std::string>> strings,
                          std::initializer_list<std::pair<const char*, float>> floats = {},
                          std::initializer_list<std::pair<const char*, int>> ints = {}) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
+        std::vector<ustring> names;
+        names.reserve(strings.size());
+        std::vector<Param> params;
         for (const auto& [name, value] : strings) {
-            const ustring s(value);
-            ss.Parameter(*g, name, TypeString, &s);
+            names.emplace_back(value);
+            params.push_back({name, TypeString, &names.back()});
         }
-        for (const auto& [name, value] : floats) ss.Parameter(*g, name, TypeFloat, &value);
-        for (const auto& [name, value] : ints) ss.Parameter(*g, name, TypeInt, &value);
-        EXPECT_TRUE(ss.Shader(*g, "surface", shader, "layer"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        return g;
+        for (const auto& [name, value] : floats) params.push_back({name, TypeFloat, &value});
+        for (const auto& [name, value] : ints) params.push_back({name, TypeInt, &value});
+        return single(shader, params);
     }
 
-    void run(ShaderGroup& g, float u = 0.5f, float v = 0.5f) {
-        ShaderGlobals sg = globalsAt(u, v);
-        sg.dvdx = 0.0f;
-        sg.dudy = 0.0f;
-        ASSERT_TRUE(ss.execute(*ctx, g, 0, sg));
-    }
+    void run(ShaderGroup& g, float u = 0.5f, float v = 0.5f) { ASSERT_TRUE(execute(g, u, v)); }
 
-    template <typename T>
-    const T* get(ShaderGroup& g, const char* symbol) {
-        const ShaderSymbol* sym = ss.find_symbol(g, ustring(symbol));
-        EXPECT_NE(sym, nullptr) << symbol;
-        return sym ? static_cast<const T*>(ss.symbol_address(*ctx, sym)) : nullptr;
-    }
-    Color3 color(ShaderGroup& g, const char* symbol) { return *get<Color3>(g, symbol); }
+    Color3 color(ShaderGroup& g, const char* symbol) { return *value<Color3>(g, symbol); }
 
     static std::filesystem::path dir;
     static std::string rampFile, udimPattern, envFile;
-
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
 };
 
 std::filesystem::path TextureTest::dir;
@@ -296,9 +274,9 @@ TEST_F(TextureTest, ReadsColorAlphaAndLaterChannels) {
     EXPECT_NEAR(c.x, 0.3f, 1e-3f);
     EXPECT_NEAR(c.y, 0.7f, 1e-3f);
     EXPECT_NEAR(c.z, 0.25f, 1e-4f);
-    EXPECT_NEAR(*get<float>(*g, "a"), 0.5f, 1e-4f);
-    EXPECT_NEAR(*get<float>(*g, "f"), 0.7f, 1e-3f) << "firstchannel 1 reads green";
-    EXPECT_EQ(*get<ustring>(*g, "err"), ustring("")) << "a lookup that works clears the message";
+    EXPECT_NEAR(*value<float>(*g, "a"), 0.5f, 1e-4f);
+    EXPECT_NEAR(*value<float>(*g, "f"), 0.7f, 1e-3f) << "firstchannel 1 reads green";
+    EXPECT_EQ(*value<ustring>(*g, "err"), ustring("")) << "a lookup that works clears the message";
     EXPECT_EQ(handler.errors, "");
 }
 
@@ -320,7 +298,7 @@ TEST_F(TextureTest, MissingFileGoesToTheErrorMessageOutput) {
     const std::string name = (dir / uniqueName("absent")).string() + ".exr";
     ShaderGroupRef g = group("lookup", {{"filename", name}});
     run(*g);
-    const ustring err = *get<ustring>(*g, "err");
+    const ustring err = *value<ustring>(*g, "err");
     EXPECT_NE(err.string().find(name), std::string::npos) << err;
     EXPECT_EQ(handler.errors, "") << "the shader asked for the message itself";
     EXPECT_EQ(color(*g, "C"), Color3(0.0f)) << "channels of a failed lookup are the fill value";
@@ -341,7 +319,7 @@ TEST_F(TextureTest, MissingColorAndAlphaStandInForAMissingFile) {
     ShaderGroupRef g = group("missing", {{"filename", name}});
     run(*g);
     EXPECT_EQ(color(*g, "C"), Color3(1.0f, 0.0f, 0.0f));
-    EXPECT_FLOAT_EQ(*get<float>(*g, "a"), 0.75f);
+    EXPECT_FLOAT_EQ(*value<float>(*g, "a"), 0.75f);
     EXPECT_EQ(handler.errors, "") << "a missing colour makes a missing file no error";
 }
 
@@ -349,7 +327,7 @@ TEST_F(TextureTest, MissingColorIsNotUsedForAFileThatExists) {
     ShaderGroupRef g = group("missing", {{"filename", rampFile}});
     run(*g, 0.3f, 0.6f);
     EXPECT_NEAR(color(*g, "C").x, 0.3f, 0.02f);
-    EXPECT_NEAR(*get<float>(*g, "a"), 0.5f, 1e-3f);
+    EXPECT_NEAR(*value<float>(*g, "a"), 0.5f, 1e-3f);
 }
 
 TEST_F(TextureTest, DerivativesFollowTheCoordinates) {
@@ -398,27 +376,27 @@ TEST_F(TextureTest, GetTextureInfoAnswersAndLeavesUnknownsAlone) {
         group("info", {{"filename", rampFile}, {"udim", udimPattern}, {"missing", missing}},
               {{"s", 1.5f}, {"t", 0.5f}});
     run(*g);
-    const int* ok = get<int>(*g, "ok");
-    const int* res = get<int>(*g, "res");
+    const int* ok = value<int>(*g, "ok");
+    const int* res = value<int>(*g, "res");
     EXPECT_EQ(ok[0], 1);
     EXPECT_EQ(res[0], 16);
     EXPECT_EQ(res[1], 16);
     EXPECT_EQ(ok[1], 1);
-    EXPECT_EQ(*get<int>(*g, "chans"), 4);
+    EXPECT_EQ(*value<int>(*g, "chans"), 4);
     EXPECT_EQ(ok[2], 1);
-    EXPECT_EQ(*get<ustring>(*g, "format"), ustring("Plain Texture"));
+    EXPECT_EQ(*value<ustring>(*g, "format"), ustring("Plain Texture"));
     EXPECT_EQ(ok[3], 0) << "an unknown name is no answer";
-    EXPECT_EQ(*get<float>(*g, "untouched"), 7.0f) << "and leaves the destination";
+    EXPECT_EQ(*value<float>(*g, "untouched"), 7.0f) << "and leaves the destination";
     EXPECT_EQ(ok[4], 1);
-    const int* tile = get<int>(*g, "tileres");
+    const int* tile = value<int>(*g, "tileres");
     EXPECT_EQ(tile[0], 32) << "s = 1.5 lies in tile 1002";
     EXPECT_EQ(tile[1], 32);
     EXPECT_EQ(ok[5], 1);
-    EXPECT_EQ(*get<int>(*g, "udimexists"), 1);
+    EXPECT_EQ(*value<int>(*g, "udimexists"), 1);
     EXPECT_EQ(ok[6], 1) << "existence is an answer even for a missing file";
-    EXPECT_EQ(*get<int>(*g, "exists"), 0);
+    EXPECT_EQ(*value<int>(*g, "exists"), 0);
     EXPECT_EQ(ok[7], 0);
-    EXPECT_EQ(*get<ustring>(*g, "missingformat"), ustring("none"));
+    EXPECT_EQ(*value<ustring>(*g, "missingformat"), ustring("none"));
     EXPECT_EQ(handler.errors.find("[RendererServices::get_texture_info] "), 0u) << handler.errors;
 }
 
@@ -427,7 +405,7 @@ TEST_F(TextureTest, GetTextureInfoPicksTheUdimTileUnderTheCoordinates) {
         group("info", {{"filename", rampFile}, {"udim", udimPattern}, {"missing", rampFile}},
               {{"s", 0.5f}, {"t", 0.5f}});
     run(*g);
-    EXPECT_EQ(get<int>(*g, "tileres")[0], 8) << "s = 0.5 lies in tile 1001";
+    EXPECT_EQ(value<int>(*g, "tileres")[0], 8) << "s = 0.5 lies in tile 1001";
 }
 
 TEST_F(TextureTest, UdimLookupReadsTheTileUnderTheCoordinates) {

@@ -8,6 +8,9 @@
 
 #include <gtest/gtest.h>
 
+#include <memory>
+#include <vector>
+
 using namespace OSL;
 using namespace runtime_test;
 
@@ -50,42 +53,22 @@ public:
     }
 };
 
-class FixedSpacesTest : public ::testing::Test {
+class FixedSpacesTest : public ShadingFixture {
 protected:
-    FixedSpacesTest() : ss(&renderer, nullptr, &handler) {
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("xform", kTransformOso));
-        EXPECT_TRUE(ss.LoadMemoryCompiledShader("xformc", kTransformcOso));
-        thread = ss.create_thread_info();
-        ctx = ss.get_context(thread);
-    }
-    ~FixedSpacesTest() override {
-        ss.release_context(ctx);
-        ss.destroy_thread_info(thread);
-    }
+    FixedSpacesTest()
+        : ShadingFixture({{"xform", kTransformOso}, {"xformc", kTransformcOso}},
+                         std::make_unique<MySpaceRenderer>()) {}
 
     // Runs `shader` with the two spaces set (fixed unless `perPoint`) and returns `out`.
     Vec3 run(const char* shader, const char* out, const char* from, const char* to,
              bool perPoint = false, const Vec3* color = nullptr) {
-        ShaderGroupRef g = ss.ShaderGroupBegin("");
         const ustring f(from), t(to);
-        ss.Parameter(*g, "fromspace", TypeString, &f, !perPoint);
-        ss.Parameter(*g, "tospace", TypeString, &t, !perPoint);
-        if (color) ss.Parameter(*g, "c", TypeColor, color);
-        EXPECT_TRUE(ss.Shader(*g, "surface", shader, "l"));
-        EXPECT_TRUE(ss.ShaderGroupEnd(*g));
-        ShaderGlobals sg = globalsAt(0.5f, 0.5f);
-        EXPECT_TRUE(ss.execute(*ctx, *g, 0, sg));
-        const ShaderSymbol* sym = ss.find_symbol(*g, ustring(out));
-        EXPECT_NE(sym, nullptr);
-        if (!sym) return Vec3(-1.0f);
-        return *static_cast<const Vec3*>(ss.symbol_address(*ctx, sym));
+        std::vector<Param> params = {{"fromspace", TypeString, &f, !perPoint},
+                                     {"tospace", TypeString, &t, !perPoint}};
+        if (color) params.push_back({"c", TypeColor, color});
+        ShaderGroupRef g = single(shader, params);
+        return ShadingFixture::run<Vec3>(*g, out);
     }
-
-    MySpaceRenderer renderer;
-    CollectingHandler handler;
-    ShadingSystem ss;
-    PerThreadInfo* thread = nullptr;
-    ShadingContext* ctx = nullptr;
 };
 
 TEST_F(FixedSpacesTest, FixedUnknownSpaceToItselfIsTheIdentityWithoutError) {
