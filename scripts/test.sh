@@ -8,12 +8,12 @@ export QT_QPA_PLATFORM=${QT_QPA_PLATFORM:-offscreen}
 ctest --test-dir "$BUILD_DIR" --output-on-failure -j "${TESSEL_JOBS:-$(nproc)}" "$@"
 
 # The shading runtime's threading tests under ThreadSanitizer, in a build folder of their own
-# (only that test program is built). TESSEL_TSAN=0 skips this step.
+# (only the threading tests and the libraries they need are built). TESSEL_TSAN=0 skips this step.
 if [ "${TESSEL_TSAN:-1}" != "0" ]; then
     TSAN_DIR="${BUILD_DIR}-tsan"
     cmake -S . -B "$TSAN_DIR" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DTESSEL_SANITIZE=thread \
         -DTESSEL_BUILD_BENCH=OFF ${TESSEL_CMAKE_ARGS:-} > /dev/null
-    cmake --build "$TSAN_DIR" --target osl_runtime_tests -j "${TESSEL_JOBS:-$(nproc)}"
+    cmake --build "$TSAN_DIR" --target osl_concurrency_tests -j "${TESSEL_JOBS:-$(nproc)}"
     TSAN_OPTIONS="halt_on_error=1 second_deadlock_stack=1 ${TSAN_OPTIONS:-}" \
-        "$TSAN_DIR/bin/osl_runtime_tests" --gtest_filter='ShadingConcurrency.*'
+        "$TSAN_DIR/bin/osl_concurrency_tests"
 fi
