@@ -243,9 +243,13 @@ int CodeGen::emit(const std::string& name, std::vector<Symbol*> args, std::strin
 // ---------------------------------------------------------------- declarations
 
 void CodeGen::declareStruct(const Node* n) {
-    if (m_structs.count(n->name)) {
-        error(n, "struct type '" + n->name + "' already declared");
-        return;
+    bool taken = m_structs.count(n->name) != 0;
+    if (taken || isGlobalName(n->name) || m_functions.count(n->name)) {
+        std::string msg(1, '"');
+        msg += n->name;
+        msg += "\" already declared in this scope";
+        error(n, msg);
+        if (taken) return;
     }
     auto* spec = new StructSpec(ustring(n->name), 0);
     std::set<std::string> seen;
@@ -298,7 +302,33 @@ void CodeGen::declareFunction(const Node* n) {
         fp.output = p->typeName.isOutput;
         fn->params.push_back(fp);
     }
+    if (n->body && fn->file != "stdosl.h") warnIfRedefined(*fn, n);
     m_functions[n->name].push_back(std::move(fn));
+}
+
+// A second body for the same return and parameter types is allowed (the later one is used) but
+// is worth a warning, as oslc gives; prototypes without a body do not count.
+void CodeGen::warnIfRedefined(const FunctionSymbol& fn, const Node* at) {
+    auto it = m_functions.find(fn.name);
+    if (it == m_functions.end()) return;
+    std::string places;
+    for (auto r = it->second.rbegin(); r != it->second.rend(); ++r) {
+        const FunctionSymbol& other = **r;
+        bool sameTypes = other.ret == fn.ret && other.params.size() == fn.params.size();
+        for (size_t i = 0; sameTypes && i < fn.params.size(); ++i)
+            sameTypes = other.params[i].type == fn.params[i].type;
+        bool defined = (other.decl && other.decl->body) || other.file == "stdosl.h";
+        if (!sameTypes || !defined) continue;
+        places += "\n    ";
+        places += std::filesystem::path(other.file).filename().string();
+        places += ':';
+        places += std::to_string(other.line);
+    }
+    if (places.empty()) return;
+    std::string msg = "Function '";
+    msg += fn.signature();
+    msg += "' redefined in the same scope\n  Previous definitions:";
+    warning(at, msg + places);
 }
 
 void CodeGen::checkFunctionBody(FunctionSymbol* fn) {
@@ -973,7 +1003,7 @@ void CodeGen::loop(const Node* s) {
 void CodeGen::returnStatement(const Node* s) {
     if (m_inline.empty()) {
         // `return` in the shader body ends the shader.
-        if (s->kid(0)) error(s, "Cannot return a value from a shader");
+        if (s->kid(0)) error(s, "Cannot return a value from a shader body");
         emit("exit", {}, "");
         return;
     }

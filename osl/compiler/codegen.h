@@ -82,6 +82,7 @@ private:
     // declarations
     void declareStruct(const Node* n);
     void declareFunction(const Node* n);
+    void warnIfRedefined(const FunctionSymbol& fn, const Node* at);
     void checkFunctionBody(FunctionSymbol* fn);
     void compileShader(const Node* n, ShaderUnit& out);
     void shaderParam(const Node* p, ShaderUnit& out);

@@ -499,7 +499,7 @@ Symbol* CodeGen::unary(const Node* e) {
                                           : "__operator__not__";
     if (Symbol* r = operatorCall(overload, {a}, e)) return r;
     if (a->type.is_structure_based() || a->type.is_array() || a->type.is_string()) {
-        error(e, "Can't do '" + e->op + "' to a " + a->type.string());
+        error(e, "Can't do '" + e->op + "' to a " + a->type.string() + ".");
         return temp(a->type);
     }
     if (e->op == "-") {

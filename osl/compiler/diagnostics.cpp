@@ -22,6 +22,7 @@ void Diagnostics::error(const std::string& file, int line, const std::string& te
 }
 
 void Diagnostics::warning(const std::string& file, int line, const std::string& text) {
+    if (m_nowarn.count({file, line})) return;
     if (warningsAreErrors) {
         error(file, line, text);
         return;

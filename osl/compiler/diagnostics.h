@@ -4,7 +4,9 @@
 
 #include <OSL/oslconfig.h>
 
+#include <set>
 #include <string>
+#include <utility>
 
 namespace OSL::pvt {
 
@@ -15,6 +17,8 @@ public:
     void error(const std::string& file, int line, const std::string& text);
     void warning(const std::string& file, int line, const std::string& text);
     void info(const std::string& text);
+    // `#pragma osl nowarn`: no warning (nor a -Werror error made from one) at this file and line.
+    void suppressWarningsAt(const std::string& file, int line) { m_nowarn.insert({file, line}); }
 
     int errorCount() const { return m_errors; }
     bool warningsAreErrors = false;
@@ -25,6 +29,7 @@ private:
     void emit(int code, const std::string& msg);
     ErrorHandler* m_handler;
     int m_errors = 0;
+    std::set<std::pair<std::string, int>> m_nowarn;
 };
 
 } // namespace OSL::pvt

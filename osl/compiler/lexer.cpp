@@ -22,8 +22,8 @@ int Lexer::fileIndex(const std::string& name) {
 }
 
 void Lexer::pragma(const std::string& text, int file, int line) {
-    // `#pragma error "msg"` / `#pragma warning "msg"` report; `#pragma osl ...` and others are
-    // accepted silently.
+    // `#pragma error "msg"` / `#pragma warning "msg"` report; `#pragma osl nowarn` silences the
+    // warnings of the next line; other pragmas are accepted silently.
     size_t p = text.find_first_not_of(" \t");
     std::string rest = p == std::string::npos ? "" : text.substr(p);
     auto word = rest.substr(0, rest.find_first_of(" \t"));
@@ -35,6 +35,11 @@ void Lexer::pragma(const std::string& text, int file, int line) {
         m_ok = false;
     } else if (word == "warning") {
         m_diag.warning(m_files[file], line, msg);
+    } else if (word == "osl") {
+        size_t a = rest.find_first_not_of(" \t", word.size());
+        std::string what = a == std::string::npos ? "" : rest.substr(a);
+        if (what.substr(0, what.find_first_of(" \t")) == "nowarn")
+            m_diag.suppressWarningsAt(m_files[file], line + 1);
     }
 }
 

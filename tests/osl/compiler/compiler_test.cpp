@@ -163,7 +163,7 @@ TEST(Compiler, WerrorTurnsWarningsIntoErrors) {
 TEST(Compiler, StructHeadersShipWithTheCompiler) {
     auto r = compile(
         "#include \"color4.h\"\n#include \"vector2.h\"\n#include \"matrix33.h\"\n"
-        "shader test (color4 c = {color(1), 0.5}, output vector2 v = {0, 0}) { v.x = c.a; }\n");
+        "shader test (color4 c = {color(1), 0.5}, output vector2 w = {0, 0}) { w.x = c.a; }\n");
     ASSERT_TRUE(r->ok) << (r->eh.errors.empty() ? "" : r->eh.errors[0]);
     EXPECT_TRUE(hasLine(r->oso, "param\tcolor\tc.rgb\t1 1 1\t\t"));
 }

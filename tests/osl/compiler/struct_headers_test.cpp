@@ -121,7 +121,7 @@ TEST(StructHeaders, Matrix33KeepsItsBorder) {
     auto c = compile("matrix33.h",
                      "matrix33 a = matrix44To33(matrix(2)), b = a * a;"
                      " b = b + a; b = b * 0.5; b = transpose(b); f = determinant(b);"
-                     " vector v = transform(b, vector(1, 0, 0)); f += v[0] + isValidAs33(b.m);"
+                     " vector w = transform(b, vector(1, 0, 0)); f += w[0] + isValidAs33(b.m);"
                      " matrix m = matrix33To44(b / a);");
     ASSERT_TRUE(c->ok) << c->firstError();
     EXPECT_EQ(countOps(c->oso, "determinant"), 1);
