@@ -47,7 +47,8 @@ struct Op {
     std::string name;
     std::vector<Symbol*> args;
     std::vector<int> jumps;
-    std::string rw; // one 'r', 'w' or 'W' (read and written) per argument
+    std::string rw;             // one 'r', 'w' or 'W' (read and written) per argument
+    std::vector<int> argDerivs; // arguments whose derivatives the op reads
     int file = 0;
     int line = 0;
 };

@@ -12,7 +12,8 @@ namespace OSL {
 bool selectKernel(ShadingSystemImpl& sys, Program& prog, Instr& in, ustring opname,
                   std::string& error);
 
-// Ops whose listed arguments have their derivatives taken, beyond what %argderivs hints say.
-bool opTakesDerivs(ustring opname, int arg);
+// Whether `op` reads the derivatives of its argument `arg` whatever its result needs, beyond
+// what %argderivs hints say.
+bool opTakesDerivs(const ShaderMaster& m, const MasterOp& op, int arg);
 
 } // namespace OSL

@@ -349,21 +349,55 @@ int selectDataKernel(KernelChoice& k) {
     return 0;
 }
 
-bool opTakesDerivs(ustring opname, int arg) {
-    const std::string_view op = opname.string();
-    if (arg == 1 && (op == "Dx" || op == "Dy" || op == "Dz" || op == "filterwidth" ||
-                     op == "area" || op == "calculatenormal"))
+namespace {
+
+const MasterSymbol* opArgSymbol(const ShaderMaster& m, const MasterOp& op, int arg) {
+    if (arg < 0 || arg >= op.nargs) return nullptr;
+    const int s = m.args[size_t(op.firstArg + arg)];
+    return s >= 0 ? &m.symbols[size_t(s)] : nullptr;
+}
+
+bool isScalarArg(const MasterSymbol* s) {
+    return s && (s->type.is_float() || s->type.is_int());
+}
+
+// Gabor noise filters over the footprint of its position, so a noise op named "gabor", or by a
+// string known only while shading, reads the derivatives of its position even when its result
+// has none: the point (the time of the 4-D form is not used), or the one or two floats. Periods
+// and options never need them; unnamed noise and the other kinds differentiate their result
+// only, which the derivative analysis already traces back to the coordinates.
+bool noisePositionTakesDerivs(const ShaderMaster& m, const MasterOp& op, int arg) {
+    const std::string_view name = op.opname.string();
+    if (name != "noise" && name != "pnoise" && name != "snoise" && name != "psnoise") return false;
+    if (arg != 2 && arg != 3) return false;
+    const MasterSymbol* kind = opArgSymbol(m, op, 1);
+    if (!kind || !kind->type.is_string()) return false;
+    if (kind->symtype == SymTypeConst && (kind->sdefaults.empty() || kind->sdefaults[0] != "gabor"))
+        return false;
+    const MasterSymbol* first = opArgSymbol(m, op, 2);
+    if (first && first->type.is_triple()) return arg == 2;
+    if (!isScalarArg(first)) return false;
+    if (arg == 2) return true;
+    // A float after the first is its second coordinate, unless it is the period of the 1-D
+    // periodic form (x, px), which is followed by nothing or by options.
+    if (name[0] == 'p')
+        return isScalarArg(opArgSymbol(m, op, 3)) && isScalarArg(opArgSymbol(m, op, 4)) &&
+               isScalarArg(opArgSymbol(m, op, 5));
+    return isScalarArg(opArgSymbol(m, op, 3));
+}
+
+} // namespace
+
+bool opTakesDerivs(const ShaderMaster& m, const MasterOp& op, int arg) {
+    const std::string_view name = op.opname.string();
+    if (arg == 1 && (name == "Dx" || name == "Dy" || name == "Dz" || name == "filterwidth" ||
+                     name == "area" || name == "calculatenormal"))
         return true;
     // Texture filtering reads the footprint of its coordinates.
-    if ((op == "texture" && (arg == 2 || arg == 3)) || (op == "texture3d" && arg == 2) ||
-        (op == "environment" && arg == 2))
+    if ((name == "texture" && (arg == 2 || arg == 3)) || (name == "texture3d" && arg == 2) ||
+        (name == "environment" && arg == 2))
         return true;
-    // noise("gabor", ...) filters with the footprint of its position (arguments 2 and 3 when
-    // the op has a name); the name is not visible here, so every noise form marks them.
-    if ((arg == 2 || arg == 3) &&
-        (op == "noise" || op == "pnoise" || op == "snoise" || op == "psnoise"))
-        return true;
-    return false;
+    return noisePositionTakesDerivs(m, op, arg);
 }
 
 } // namespace OSL

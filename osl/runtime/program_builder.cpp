@@ -146,7 +146,7 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
             for (int a = 0; a < op.nargs; ++a) {
                 const int s = m.args[op.firstArg + a];
                 if (s < 0 || !derivCapable(m.symbols[s].type)) continue;
-                if ((op.argDerivs & (1u << a)) || opTakesDerivs(op.opname, a)) needs[l][s] = 1;
+                if ((op.argDerivs & (1u << a)) || opTakesDerivs(m, op, a)) needs[l][s] = 1;
             }
     }
     for (bool changed = true; changed;) {
