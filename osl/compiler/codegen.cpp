@@ -151,6 +151,14 @@ std::string CodeGen::scopedName(const std::string& name) {
     return "___" + std::to_string(m_scopes.back().id) + "_" + name;
 }
 
+// Names starting with three underscores are the compiler's own (scoped and inlined names).
+static std::string underscores(const std::string& name) {
+    std::string msg(1, '"');
+    msg += name;
+    msg += "\" : sorry, can't start with three underscores";
+    return msg;
+}
+
 // Names are unique within a scope. The shader's parameters and the top level of its body share
 // the global scope with the shader globals and every function, as in oslc: there a name that is
 // already a function is an error, except for a parameter, which only gets a warning.
@@ -164,6 +172,7 @@ void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
     std::string clash(1, '"');
     clash += name;
     clash += "\" already declared in this scope";
+    if (name.rfind("___", 0) == 0) error(at, underscores(name));
     if (scope.vars.count(name)) {
         const Node* prior = scope.declaredAt[name];
         error(at, prior ? clash + previousAt(fileOf(prior), prior->line) : clash);
@@ -296,12 +305,16 @@ void CodeGen::declareFunction(const Node* n) {
             fn->variadic = true;
             continue;
         }
+        if (p->kid(0) && fn->file != "stdosl.h")
+            error(p.get(),
+                  "function parameter '" + p->name + "' may not have a default initializer.");
         FunctionSymbol::Param fp;
         fp.type = resolveType(p->typeName, p.get());
         fp.name = p->name;
         fp.output = p->typeName.isOutput;
         fn->params.push_back(fp);
     }
+    if (fn->file != "stdosl.h" && n->name.rfind("___", 0) == 0) error(n, underscores(n->name));
     if (n->body && fn->file != "stdosl.h") warnIfRedefined(*fn, n);
     m_functions[n->name].push_back(std::move(fn));
 }
@@ -697,7 +710,11 @@ void CodeGen::compileShader(const Node* n, ShaderUnit& out) {
     for (const auto& m : n->metadata) out.metaHints.push_back(metaHint(m.get()));
     pushScope();
     m_shaderScopeDepth = int(m_scopes.size()) - 1;
-    for (const auto& p : n->kids) shaderParam(p.get(), out);
+    for (const auto& p : n->kids) {
+        if (!p->kid(0))
+            error(p.get(), "shader parameter '" + p->name + "' requires a default initializer");
+        shaderParam(p.get(), out);
+    }
     out.mainBegin = nextOp();
     for (const auto& s : n->body->kids) statement(s.get());
     emit("end", {});

@@ -237,7 +237,8 @@ CodeGen::LRef CodeGen::lvalue(const Node* e, bool forWrite) {
         LRef b = lvalue(e->kid(0), forWrite);
         Symbol* idx = expr(e->kid(1));
         if (!idx->type.is_int() && !idx->type.is_unknown())
-            error(e, "array index must be an integer");
+            error(e, std::string(b.type.is_array() ? "array" : "component") +
+                         " index must be an integer, not a " + idx->type.string());
         m_curLine = e->line;
         if (b.type.is_array() && !b.index && !b.comp) {
             r = b;
@@ -439,8 +440,7 @@ Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected) {
     bool ok = true;
     TypeSpec rt = arithmeticResult(e->op, a->type, b->type, ok);
     if (!ok) {
-        error(e, "Don't know how to compute " + a->type.string() + " " + e->op + " " +
-                     b->type.string());
+        error(e, "Not allowed: '" + a->type.string() + " " + e->op + " " + b->type.string() + "'");
         return temp(rt);
     }
     static const std::map<std::string, std::string> names = {
@@ -582,8 +582,7 @@ Symbol* CodeGen::assign(const Node* e) {
     bool ok = true;
     TypeSpec rt = arithmeticResult(op, cur->type, v->type, ok);
     if (!ok) {
-        error(e, "Don't know how to compute " + cur->type.string() + " " + op + " " +
-                     v->type.string());
+        error(e, "Not allowed: '" + cur->type.string() + " " + op + " " + v->type.string() + "'");
         return cur;
     }
     static const std::map<std::string, std::string> names = {

@@ -349,4 +349,33 @@ TEST(ErrorWording, MatchesOslc) {
     EXPECT_EQ(fn->eh.errors[0], "test.osl:1: error: \"noise\" already declared in this scope");
 }
 
+TEST(ErrorWording, OperatorsIndicesAndDeclarations) {
+    auto bin = compile(shader("    float x = name * 2;\n    x += name;\n"));
+    ASSERT_EQ(bin->eh.errors.size(), 2u) << all(bin->eh.errors);
+    EXPECT_EQ(bin->eh.errors[0], "test.osl:3: error: Not allowed: 'string * int'");
+    EXPECT_EQ(bin->eh.errors[1], "test.osl:4: error: Not allowed: 'float + string'");
+    auto idx = compile(shader("    float a[2];\n    float x = a[1.5];\n    x = P[0.5];\n"));
+    ASSERT_EQ(idx->eh.errors.size(), 2u) << all(idx->eh.errors);
+    EXPECT_EQ(idx->eh.errors[0], "test.osl:4: error: array index must be an integer, not a float");
+    EXPECT_EQ(idx->eh.errors[1],
+              "test.osl:5: error: component index must be an integer, not a float");
+    auto param = compile("shader test (float a, float b = 1)\n{\n}\n");
+    ASSERT_EQ(param->eh.errors.size(), 1u) << all(param->eh.errors);
+    EXPECT_EQ(param->eh.errors[0],
+              "test.osl:1: error: shader parameter 'a' requires a default initializer");
+    auto fparam = compile("float f(float a = 1) { return a; }\nshader test ()\n{\n}\n");
+    ASSERT_EQ(fparam->eh.errors.size(), 1u) << all(fparam->eh.errors);
+    EXPECT_EQ(fparam->eh.errors[0],
+              "test.osl:1: error: function parameter 'a' may not have a default initializer.");
+    auto under = compile("float ___f(float a) { return a; }\nshader test ()\n{\n"
+                         "    float ___x = 1;\n}\n");
+    ASSERT_EQ(under->eh.errors.size(), 2u) << all(under->eh.errors);
+    EXPECT_EQ(under->eh.errors[0],
+              "test.osl:1: error: \"___f\" : sorry, can't start with three underscores");
+    EXPECT_EQ(under->eh.errors[1],
+              "test.osl:4: error: \"___x\" : sorry, can't start with three underscores");
+    auto two = compile(shader("    float __x = 1;\n    out = __x;\n"));
+    EXPECT_TRUE(two->ok) << all(two->eh.errors);
+}
+
 } // namespace
