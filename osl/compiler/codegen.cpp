@@ -160,8 +160,10 @@ static std::string underscores(const std::string& name) {
 }
 
 // Names are unique within a scope. The shader's parameters and the top level of its body share
-// the global scope with the shader globals and every function, as in oslc: there a name that is
-// already a function is an error, except for a parameter, which only gets a warning.
+// the global scope with every function, as in oslc: there a name that is already a function is
+// an error, except for a parameter, which only gets a warning. (oslc's global scope also holds
+// the shader globals, so it rejects a parameter or top-level local named `v` or `P` too; we
+// accept those, which existing shaders rely on.)
 void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
     Scope& scope = m_scopes.back();
     auto previousAt = [&](const std::string& file, int line) {
