@@ -182,9 +182,7 @@ void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
     }
     if (int(m_scopes.size()) - 1 == m_shaderScopeDepth) {
         auto fn = m_functions.find(name);
-        if (isGlobalName(name)) {
-            error(at, clash);
-        } else if (fn != m_functions.end() && !fn->second.empty()) {
+        if (fn != m_functions.end() && !fn->second.empty()) {
             const FunctionSymbol* last = fn->second.back().get();
             std::string msg = clash + previousAt(last->file, last->line);
             if (s->symtype == SymTypeParam || s->symtype == SymTypeOutputParam)
