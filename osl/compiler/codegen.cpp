@@ -589,6 +589,9 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
         if (!t.is_unsized_array()) fillZero(s);
         return;
     }
+    // A closure parameter starts empty: `= 0` says just that and needs no code.
+    if (t.is_closure() && !t.is_array() && init->kind == NodeKind::IntLit && init->intValue == 0)
+        return;
     if (t.is_structure() && init->kind == NodeKind::InitList &&
         init->kids.size() <= s->fields.size()) {
         // A struct default made of constants gives each field its own default.
@@ -966,7 +969,7 @@ void CodeGen::ifStatement(const Node* s) {
         error(s, "Cannot use a " + cond->type.string() + " as a condition");
     m_curLine = s->line;
     m_curFile = s->file;
-    if (!cond->type.is_int() && !cond->type.is_closure()) {
+    if (!cond->type.is_int()) {
         Symbol* t = temp(TypeSpec(TypeDesc::TypeInt));
         emit("neq", {t, cond, constInt(0)});
         cond = t;
@@ -998,7 +1001,9 @@ void CodeGen::loop(const Node* s) {
         emit("neq", {t, cond, constInt(0)});
         cond = t;
     } else {
-        cond = constInt(1);
+        // A loop without a condition tests the constant 1, as oslc writes it.
+        cond = temp(TypeSpec(TypeDesc::TypeInt));
+        emit("neq", {cond, constInt(1), constInt(0)});
     }
     int bodyStart = nextOp();
     m_loops.push_back({});

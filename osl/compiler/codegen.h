@@ -101,16 +101,17 @@ private:
 
     // expressions
     Symbol* expr(const Node* e, const TypeSpec* expected = nullptr);
-    Symbol* binary(const Node* e, const TypeSpec* expected = nullptr);
+    Symbol* binary(const Node* e, const TypeSpec* expected = nullptr, Symbol* dest = nullptr);
     Symbol* logical(const Node* e);
-    Symbol* unary(const Node* e);
+    Symbol* unary(const Node* e, Symbol* dest = nullptr);
     Symbol* incdec(const Node* e);
     Symbol* assign(const Node* e);
     Symbol* ternary(const Node* e, Symbol* dest = nullptr);
     Symbol* typeCtor(const Node* e);
     Symbol* foldTriple(const TypeSpec& t, const std::vector<Symbol*>& args);
     Symbol* call(const Node* e, const TypeSpec* expected, Symbol* dest = nullptr);
-    Symbol* structCtor(const Node* e, int structId);
+    Symbol* structCtor(const Node* e, int structId, Symbol* dest = nullptr);
+    bool mentions(const Node* e, const Symbol* root);
     Symbol* initList(const Node* e, const TypeSpec& t);
     Symbol* indexRead(const Node* e);
     Symbol* fieldRead(const Node* e);
@@ -118,13 +119,14 @@ private:
     Symbol* load(const LRef& r, const Node* at);
     void store(const LRef& r, Symbol* value, const Node* at, bool checkWrite = true);
     Symbol* convert(Symbol* v, const TypeSpec& to, const Node* at);
+    Symbol* arrayElement(Symbol* value, const TypeSpec& et, const Node* at);
     void assignInto(Symbol* dst, Symbol* src, const Node* at);
     bool retarget(Symbol* dst, Symbol* src);
     void checkWritable(Symbol* s, const Node* at, const std::string& context = "",
                        bool plainAssign = false);
     Symbol* voidValue();
     Symbol* operatorCall(const std::string& opname, const std::vector<Symbol*>& args,
-                         const Node* at);
+                         const Node* at, Symbol* dest = nullptr);
     Symbol* inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
                        std::vector<LRef>& argRefs, Symbol* dest = nullptr);
     Symbol* exprInto(const Node* e, Symbol* dest, const TypeSpec* expected);

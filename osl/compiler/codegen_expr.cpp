@@ -13,6 +13,11 @@ const TypeSpec kInt(TypeDesc::TypeInt);
 const TypeSpec kFloat(TypeDesc::TypeFloat);
 const TypeSpec kString(TypeDesc::TypeString);
 
+const Symbol* rootOf(const Symbol* s) {
+    while (s && s->structParent) s = s->structParent;
+    return s;
+}
+
 bool isZeroConst(const Symbol* s) {
     return s->isConst() && ((s->type.is_int() && !s->ivals.empty() && s->ivals[0] == 0) ||
                             (s->type.is_float() && !s->fvals.empty() && s->fvals[0] == 0.f));
@@ -320,6 +325,18 @@ Symbol* CodeGen::load(const LRef& r, const Node* at) {
     return base;
 }
 
+// The value stored into an array element of type `et`. The op converts one number into
+// another itself; a number stored into a triple element is widened by an `assign` first, even
+// when it is a constant, as oslc does.
+Symbol* CodeGen::arrayElement(Symbol* value, const TypeSpec& et, const Node* at) {
+    if (et.is_scalarnum() && value->type.is_scalarnum()) return value;
+    if (!et.is_triple() || et.is_array() || !value->type.is_scalarnum())
+        return convert(value, et, at);
+    Symbol* t = temp(et);
+    emit("assign", {t, value});
+    return t;
+}
+
 void CodeGen::store(const LRef& r, Symbol* value, const Node* at, bool checkWrite) {
     if (!r.sym) return;
     if (checkWrite) checkWritable(r.sym, at);
@@ -331,12 +348,16 @@ void CodeGen::store(const LRef& r, Symbol* value, const Node* at, bool checkWrit
         assignInto(r.sym, value, at);
         return;
     }
+    // A component takes an int as it is: the op converts it, so oslc emits no conversion.
+    const auto component = [&] {
+        return value->type.is_int() ? value : convert(value, kFloat, at);
+    };
     if (r.comp && !r.comp2 && !r.index) {
-        emit("compassign", {r.sym, r.comp, convert(value, kFloat, at)});
+        emit("compassign", {r.sym, r.comp, component()});
         return;
     }
     if (r.comp2 && !r.index) {
-        emit("mxcompassign", {r.sym, r.comp, r.comp2, convert(value, kFloat, at)});
+        emit("mxcompassign", {r.sym, r.comp, r.comp2, component()});
         return;
     }
     // An array element, possibly one component of it.
@@ -354,15 +375,15 @@ void CodeGen::store(const LRef& r, Symbol* value, const Node* at, bool checkWrit
         return;
     }
     if (!r.comp) {
-        emit("aassign", {r.sym, r.index, convert(value, et, at)});
+        emit("aassign", {r.sym, r.index, arrayElement(value, et, at)});
         return;
     }
     Symbol* elem = temp(et);
     emit("aref", {elem, r.sym, r.index});
     if (r.comp2)
-        emit("mxcompassign", {elem, r.comp, r.comp2, convert(value, kFloat, at)});
+        emit("mxcompassign", {elem, r.comp, r.comp2, component()});
     else
-        emit("compassign", {elem, r.comp, convert(value, kFloat, at)});
+        emit("compassign", {elem, r.comp, component()});
     emit("aassign", {r.sym, r.index, elem});
 }
 
@@ -418,7 +439,7 @@ static TypeSpec arithmeticResult(const std::string& op, const TypeSpec& a, const
     return kFloat;
 }
 
-Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected) {
+Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected, Symbol* dest) {
     // The type wanted of an arithmetic result is also wanted of its operands, so that
     // `color C = x * noise(P)` calls the colour noise, as oslc does.
     const bool arithmetic = e->op == "+" || e->op == "-" || e->op == "*" || e->op == "/";
@@ -435,7 +456,8 @@ Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected) {
         {"!=", "ne"},   {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
         {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
     // A user-defined operator wins over the built-in meaning.
-    if (Symbol* r = operatorCall("__operator__" + overloadNames.at(e->op) + "__", {a, b}, e))
+    if (dest && (rootOf(a) == rootOf(dest) || rootOf(b) == rootOf(dest))) dest = nullptr;
+    if (Symbol* r = operatorCall("__operator__" + overloadNames.at(e->op) + "__", {a, b}, e, dest))
         return r;
     bool ok = true;
     TypeSpec rt = arithmeticResult(e->op, a->type, b->type, ok);
@@ -447,11 +469,14 @@ Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected) {
         {"+", "add"},   {"-", "sub"}, {"*", "mul"},  {"/", "div"}, {"%", "mod"}, {"==", "eq"},
         {"!=", "neq"},  {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
         {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
-    // Integers meet floats as floats.
+    // Integers meet floats as floats in arithmetic; a comparison takes both as they are.
+    const bool compare = e->op == "==" || e->op == "!=" || e->op == "<" || e->op == ">" ||
+                         e->op == "<=" || e->op == ">=";
     bool floaty =
         rt.is_float_based() || (!rt.is_int() && !rt.is_closure_based()) ||
         ((a->type.is_float() || b->type.is_float() || a->type.is_triple() || b->type.is_triple()) &&
          !(a->type.is_int() && b->type.is_int()));
+    floaty = floaty && !compare;
     if (floaty && !(rt.is_int() && a->type.is_int() && b->type.is_int())) {
         if (a->type.is_int() && !b->type.is_int()) a = convert(a, kFloat, e);
         if (b->type.is_int() && !a->type.is_int()) b = convert(b, kFloat, e);
@@ -485,7 +510,7 @@ Symbol* CodeGen::logical(const Node* e) {
     return r;
 }
 
-Symbol* CodeGen::unary(const Node* e) {
+Symbol* CodeGen::unary(const Node* e, Symbol* dest) {
     const Node* k = e->kid(0);
     if (e->op == "-" && (k->kind == NodeKind::IntLit || k->kind == NodeKind::FloatLit)) {
         return k->kind == NodeKind::IntLit ? constInt(-int(k->intValue))
@@ -497,7 +522,8 @@ Symbol* CodeGen::unary(const Node* e) {
     const char* overload = e->op == "-"   ? "__operator__neg__"
                            : e->op == "~" ? "__operator__compl__"
                                           : "__operator__not__";
-    if (Symbol* r = operatorCall(overload, {a}, e)) return r;
+    if (dest && rootOf(a) == rootOf(dest)) dest = nullptr;
+    if (Symbol* r = operatorCall(overload, {a}, e, dest)) return r;
     if (a->type.is_structure_based() || a->type.is_array() || a->type.is_string()) {
         error(e, "Can't do '" + e->op + "' to a " + a->type.string() + ".");
         return temp(a->type);
@@ -668,10 +694,12 @@ Symbol* CodeGen::typeCtor(const Node* e) {
             error(e, "Cannot construct " + t.string() + " from " + from.string());
             return temp(t);
         }
-        // A cast to the type the value already has is no conversion at all: oslc passes the
-        // value through rather than copying it.
-        if (e->isCast && from == t) return args[0];
+        // A cast or constructor to the type the value already has is no conversion at all:
+        // oslc passes the value through rather than copying it.
+        if (from == t) return args[0];
+        // `float(i)` takes a float argument: the int is converted on the way in, then copied.
         Symbol* r = temp(t);
+        if (!e->isCast && t.is_float() && from.is_int()) args[0] = convert(args[0], kFloat, e);
         emit("assign", {r, args[0]});
         return r;
     }
@@ -714,7 +742,7 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
         for (size_t i = 0; i < e->kids.size(); ++i) {
             const Node* k = e->kid(i);
             Symbol* v = k->kind == NodeKind::InitList ? initList(k, elem) : expr(k, &elem);
-            emit("aassign", {r, constInt(int(i)), convert(v, elem, k)});
+            emit("aassign", {r, constInt(int(i)), arrayElement(v, elem, k)});
         }
         return r;
     }
@@ -746,6 +774,7 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
             args.push_back(a->type.is_string() ? a : convert(a, kFloat, k.get()));
         }
         size_t want = t.is_matrix() ? 16 : 3;
+        if (Symbol* folded = foldTriple(t, args)) return folded;
         Symbol* r = temp(t);
         bool space = args.size() == want + 1 && args[0]->type.is_string();
         if (args.size() == 1) {
@@ -890,7 +919,21 @@ FunctionSymbol* CodeGen::resolveOverload(const std::string& name,
     return ties[0];
 }
 
-Symbol* CodeGen::structCtor(const Node* e, int structId) {
+// Whether `e` reads any part of the variable `root` (a struct read while it is rebuilt).
+bool CodeGen::mentions(const Node* e, const Symbol* root) {
+    if (!e) return false;
+    if (e->kind == NodeKind::VarRef) {
+        const Symbol* s = lookupVar(e->name);
+        return s && rootOf(s) == root;
+    }
+    for (const auto& k : e->kids)
+        if (mentions(k.get(), root)) return true;
+    return false;
+}
+
+// A struct constructor writes its fields straight into `dest` when given one (the variable it
+// initialises or the result of the function returning it), as oslc does.
+Symbol* CodeGen::structCtor(const Node* e, int structId, Symbol* dest) {
     StructSpec* spec = TypeSpec::structspec(structId);
     TypeSpec t(e->name.c_str(), structId);
     if (int(e->kids.size()) != spec->numfields()) {
@@ -900,7 +943,7 @@ Symbol* CodeGen::structCtor(const Node* e, int structId) {
     }
     if (int(e->kids.size()) > spec->numfields())
         error(e, "Too many initializers for struct '" + e->name + "'");
-    Symbol* r = temp(t);
+    Symbol* r = dest ? dest : temp(t);
     for (size_t i = 0; i < e->kids.size() && int(i) < spec->numfields(); ++i) {
         TypeSpec ft = spec->field(int(i)).type;
         Symbol* v = expr(e->kid(i), &ft);
@@ -915,6 +958,9 @@ Symbol* CodeGen::structCtor(const Node* e, int structId) {
 }
 
 bool CodeGen::canTarget(const Symbol* dest, const TypeSpec& t) const {
+    if (dest && dest->type.is_structure() && t.is_structure() && equivalent(dest->type, t) &&
+        dest->fields.size() == size_t(t.structspec()->numfields()))
+        return true;
     if (!dest || dest->type.is_array() || dest->type.is_structure_based() ||
         !dest->fields.empty() || dest->type.is_closure_based() || t.is_array() ||
         t.is_structure_based())
@@ -926,6 +972,28 @@ bool CodeGen::canTarget(const Symbol* dest, const TypeSpec& t) const {
 // computes each branch into it and a user function returns into it. Other expressions are
 // generated as usual (their last op is retargeted by assignInto).
 Symbol* CodeGen::exprInto(const Node* e, Symbol* dest, const TypeSpec* expected) {
+    if (e && dest && !m_checkOnly && dest->type.is_structure() && e->kind == NodeKind::Call) {
+        // A struct built by its constructor or returned by a function lands in place, unless
+        // the expression still reads the struct being written.
+        m_curLine = e->line, m_curFile = e->file;
+        auto st = m_structs.find(e->name);
+        if (st != m_structs.end())
+            return structCtor(e, st->second,
+                              canTarget(dest, TypeSpec(e->name.c_str(), st->second)) &&
+                                      !mentions(e, rootOf(dest))
+                                  ? dest
+                                  : nullptr);
+        return call(e, expected, dest);
+    }
+    if (e && dest && !m_checkOnly && dest->type.is_structure() && e->kind == NodeKind::Binary &&
+        e->op != "&&" && e->op != "||") {
+        m_curLine = e->line, m_curFile = e->file;
+        return binary(e, expected, dest);
+    }
+    if (e && dest && !m_checkOnly && dest->type.is_structure() && e->kind == NodeKind::Unary) {
+        m_curLine = e->line, m_curFile = e->file;
+        return unary(e, dest);
+    }
     if (e && dest && !m_checkOnly && !dest->type.is_array() && !dest->type.is_closure_based() &&
         !dest->type.is_structure_based() && dest->fields.empty()) {
         if (e->kind == NodeKind::Ternary) {
@@ -1007,6 +1075,8 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
         dest = nullptr;
     for (const LRef& r : refs)
         if (dest && r.sym == dest) dest = nullptr;
+    for (Symbol* a : args)
+        if (dest && rootOf(a) == rootOf(dest)) dest = nullptr;
     return inlineCall(fn, e, args, refs, dest);
 }
 
@@ -1094,7 +1164,7 @@ Symbol* CodeGen::builtinCall(FunctionSymbol* fn, const Node* e, std::vector<Symb
         rw += out ? 'w' : 'r';
     }
     m_curLine = e->line;
-    const std::string opname = fn->isClosure       ? std::string("closure")
+    const std::string opname = fn->isClosure        ? std::string("closure")
                                : fn->opname.empty() ? fn->name
                                                     : fn->opname;
     int op = emit(opname, opargs, rw);
@@ -1114,7 +1184,7 @@ Symbol* CodeGen::voidValue() {
 }
 
 Symbol* CodeGen::operatorCall(const std::string& opname, const std::vector<Symbol*>& args,
-                              const Node* at) {
+                              const Node* at, Symbol* dest) {
     if (!m_functions.count(opname)) return nullptr;
     std::vector<TypeSpec> types;
     for (Symbol* a : args) types.push_back(a->type);
@@ -1123,7 +1193,7 @@ Symbol* CodeGen::operatorCall(const std::string& opname, const std::vector<Symbo
     std::vector<Symbol*> callArgs = args;
     std::vector<LRef> refs(args.size());
     if (fn->builtin) return builtinCall(fn, at, callArgs, refs, nullptr);
-    return inlineCall(fn, at, callArgs, refs);
+    return inlineCall(fn, at, callArgs, refs, canTarget(dest, fn->ret) ? dest : nullptr);
 }
 
 Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbol*>& args,
@@ -1159,6 +1229,11 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
             if (refs[i].valid() && !refs[i].index && !refs[i].comp &&
                 equivalent(refs[i].sym->type, p.type)) {
                 a = refs[i].sym;
+            } else if (refs[i].valid() && a->symtype == SymTypeTemp &&
+                       equivalent(a->type, p.type)) {
+                // An array element or component was just loaded into a temporary of its own:
+                // the function works on it and it is stored back afterwards.
+                writeBacks.push_back({i, a});
             } else {
                 Symbol* t = newStructSymbol(
                     scopedName(p.name), p.type.is_unsized_array() ? a->type : p.type, SymTypeLocal);

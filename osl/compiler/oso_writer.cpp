@@ -194,6 +194,12 @@ std::string writeOSO(ShaderUnit& u, const std::string& options) {
             for (char c : op.rw) rw += c == 'W' ? 'W' : c;
             hints += "%argrw{\"" + rw + "\"} ";
         }
+        if (!op.argDerivs.empty()) {
+            hints += "%argderivs{";
+            for (size_t k = 0; k < op.argDerivs.size(); ++k)
+                hints.append(k ? "," : "").append(std::to_string(op.argDerivs[k]));
+            hints += "} ";
+        }
         if (!hints.empty()) hints.pop_back();
         if (op.args.empty() && op.jumps.empty()) {
             if (!hints.empty() && op.name != "end") o << "\t" << hints;
