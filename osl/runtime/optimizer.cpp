@@ -168,6 +168,7 @@ public:
     void fuseAssignments(const std::vector<uint8_t>& jumpTarget);
     void removeDeadOps();
     void warn() const;
+    void markBranchesNeverTaken(std::vector<std::vector<uint8_t>>& neverRun) const;
 
 private:
     const MasterOp& masterOp(int k) const {
@@ -342,6 +343,34 @@ bool LayerOptimizer::evaluate(Instr& in) {
     }
     if (!keep) std::memcpy(at, saved.data(), bytes);
     return keep;
+}
+
+// An `if` whose condition is fixed for the group runs one of its two branches at every sample;
+// the other branch's ops never run. Derivatives those ops would ask for are not needed.
+void LayerOptimizer::markBranchesNeverTaken(std::vector<std::vector<uint8_t>>& neverRun) const {
+    for (int k : m_a.order) {
+        const Instr& in = m_prog.instrs[size_t(k)];
+        if (in.flow != Flow::If || in.layer != m_layer || in.nargs < 1) continue;
+        const Operand& c = in.args[0];
+        if (!c.isConst && (c.symbol < 0 || !m_constant[size_t(c.symbol)])) continue;
+        const char* at = m_prog.initImage.data() + c.offset;
+        bool taken;
+        if (c.isInt)
+            taken = *reinterpret_cast<const int*>(at) != 0;
+        else if (c.isFloat)
+            taken = *reinterpret_cast<const float*>(at) != 0.0f;
+        else
+            continue;
+        const int begin = taken ? in.jump[0] : k + 1;
+        const int end = taken ? in.jump[1] : in.jump[0];
+        for (int j = std::max(begin, 0); j < std::min(end, int(m_prog.instrs.size())); ++j) {
+            const Instr& dead = m_prog.instrs[size_t(j)];
+            if (dead.layer != m_layer) continue;
+            auto& layerOps = neverRun[size_t(m_layer)];
+            if (layerOps.empty()) layerOps.assign(m_master.ops.size(), 0);
+            layerOps[size_t(dead.masterOp)] = 1;
+        }
+    }
 }
 
 void LayerOptimizer::fold() {
@@ -655,6 +684,15 @@ void optimizeProgram(ShadingSystemImpl& sys, const ShaderGroup& group, Program& 
             lo.markConstantParams();
             lo.fold();
         }
+    }
+    if (sys.optConstantFold) {
+        std::vector<std::vector<uint8_t>> neverRun(static_cast<size_t>(nlayers));
+        for (auto& lo : layers) lo->markBranchesNeverTaken(neverRun);
+        for (const auto& l : neverRun)
+            if (!l.empty()) {
+                stats.neverRun = std::move(neverRun);
+                break;
+            }
     }
     // Operands of symbols now known to be fixed are constants to the kernels: choosing again
     // lets ops specialise on them (isconstant answers, texture handles, named ray types...).

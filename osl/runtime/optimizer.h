@@ -5,6 +5,9 @@
 
 #include "program.h"
 
+#include <cstdint>
+#include <vector>
+
 namespace OSL {
 
 class ShadingSystemImpl;
@@ -14,6 +17,9 @@ struct OptimizerStats {
     int folded = 0;       // ops evaluated at build time
     int removed = 0;      // ops no longer executed (folded, dead or no-ops)
     int mergedLayers = 0; // layers whose work another identical layer does
+    // Per layer, per op of its shader: 1 for ops in a branch that a fixed condition never takes.
+    // Empty when there are none.
+    std::vector<std::vector<uint8_t>> neverRun;
 };
 
 // Optimises a program whose kernels are chosen, before it is first executed. Options come from

@@ -112,48 +112,41 @@ void writeValue(char* dst, TypeDesc t, const MasterSymbol& s, const InstanceValu
     }
 }
 
-std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup& group,
-                                      std::string& error) {
-    auto prog = std::make_unique<Program>();
-    prog->group = &group;
-    prog->system = &sys;
-    prog->serial = ++g_programSerial;
+namespace {
+
+// Which symbols of each layer carry derivatives: seeded where ops take them, then propagated
+// backwards through every op that computes a symbol from others and along connections, until
+// nothing changes. Ops marked in `neverRun` (per layer, per op) are left out.
+std::vector<std::vector<uint8_t>>
+derivativeNeeds(const ShaderGroup& group, const std::vector<std::vector<uint8_t>>& neverRun) {
     const int nlayers = int(group.layers.size());
-    if (nlayers == 0) {
-        error = "shader group has no layers";
-        return nullptr;
-    }
-
-    // Which symbols are fed by connections.
-    std::vector<std::vector<int>> connectedTo(nlayers);
-    for (size_t c = 0; c < group.connections.size(); ++c)
-        connectedTo[group.connections[c].dst.layer].push_back(int(c));
-    auto isConnectedParam = [&](int layer, int sym) {
-        for (int c : connectedTo[layer])
-            if (group.connections[c].dst.symbol == sym) return true;
-        return false;
+    auto skipped = [&](int l, size_t o) {
+        return size_t(l) < neverRun.size() && o < neverRun[size_t(l)].size() &&
+               neverRun[size_t(l)][o];
     };
-
-    // 1. Derivatives: seeded where ops take them, then propagated backwards through every op
-    //    that computes a symbol from others and along connections, until nothing changes.
     std::vector<std::vector<uint8_t>> needs(nlayers);
     for (int l = 0; l < nlayers; ++l) {
         const ShaderMaster& m = *group.layers[l].master;
         needs[l].assign(m.symbols.size(), 0);
         for (size_t s = 0; s < m.symbols.size(); ++s)
             if (m.symbols[s].hasDerivsHint && derivCapable(m.symbols[s].type)) needs[l][s] = 1;
-        for (const MasterOp& op : m.ops)
+        for (size_t o = 0; o < m.ops.size(); ++o) {
+            const MasterOp& op = m.ops[o];
+            if (skipped(l, o)) continue;
             for (int a = 0; a < op.nargs; ++a) {
                 const int s = m.args[op.firstArg + a];
                 if (s < 0 || !derivCapable(m.symbols[s].type)) continue;
                 if ((op.argDerivs & (1u << a)) || opTakesDerivs(m, op, a)) needs[l][s] = 1;
             }
+        }
     }
     for (bool changed = true; changed;) {
         changed = false;
         for (int l = 0; l < nlayers; ++l) {
             const ShaderMaster& m = *group.layers[l].master;
-            for (const MasterOp& op : m.ops) {
+            for (size_t o = 0; o < m.ops.size(); ++o) {
+                const MasterOp& op = m.ops[o];
+                if (skipped(l, o)) continue;
                 const uint32_t w = op.argWrite ? op.argWrite : (op.nargs ? 1u : 0u);
                 bool outNeeds = false;
                 for (int a = 0; a < op.nargs; ++a) {
@@ -179,6 +172,38 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
             }
         }
     }
+
+    return needs;
+}
+
+// One build; `neverRun` names ops the optimiser found a fixed condition skips (their derivative
+// needs are left out); the optimiser's own findings come back in `found`.
+std::unique_ptr<Program> buildOnce(ShadingSystemImpl& sys, const ShaderGroup& group,
+                                   std::string& error,
+                                   const std::vector<std::vector<uint8_t>>& neverRun,
+                                   std::vector<std::vector<uint8_t>>& found) {
+    auto prog = std::make_unique<Program>();
+    prog->group = &group;
+    prog->system = &sys;
+    prog->serial = ++g_programSerial;
+    const int nlayers = int(group.layers.size());
+    if (nlayers == 0) {
+        error = "shader group has no layers";
+        return nullptr;
+    }
+
+    // Which symbols are fed by connections.
+    std::vector<std::vector<int>> connectedTo(nlayers);
+    for (size_t c = 0; c < group.connections.size(); ++c)
+        connectedTo[group.connections[c].dst.layer].push_back(int(c));
+    auto isConnectedParam = [&](int layer, int sym) {
+        for (int c : connectedTo[layer])
+            if (group.connections[c].dst.symbol == sym) return true;
+        return false;
+    };
+
+    // 1. Derivatives.
+    const std::vector<std::vector<uint8_t>> needs = derivativeNeeds(group, neverRun);
 
     // 2. Layout: globals, then constants, then one region per layer (reset when it runs).
     uint32_t cursor = 0;
@@ -486,12 +511,28 @@ std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup&
         prog->optFolded = stats.folded;
         prog->optRemoved = stats.removed;
         prog->optMergedLayers = stats.mergedLayers;
+        found = std::move(stats.neverRun);
     }
     if (prog->debugUninit) {
         markUninitialized(*prog);
         for (int l = 0; l < nlayers; ++l) prog->reportedOps.push_back(reportedOpNumbers(group, l));
     }
     return prog;
+}
+
+} // namespace
+
+std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup& group,
+                                      std::string& error) {
+    std::vector<std::vector<uint8_t>> neverRun;
+    auto prog = buildOnce(sys, group, error, {}, neverRun);
+    // Ops in a branch that fixed parameters rule out never run; when they were all that asked
+    // for some derivatives, build again without them, so that the values computed are the ones
+    // computed without derivatives (as the shader would give were the branch not there).
+    if (!prog || neverRun.empty() || derivativeNeeds(group, neverRun) == derivativeNeeds(group, {}))
+        return prog;
+    std::vector<std::vector<uint8_t>> again;
+    return buildOnce(sys, group, error, neverRun, again);
 }
 
 } // namespace OSL
