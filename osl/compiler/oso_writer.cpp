@@ -63,9 +63,13 @@ void computeLifetimes(ShaderUnit& u) {
 
 std::string values(const Symbol* s) {
     std::string v;
-    for (int i : s->ivals) v += (v.empty() ? "" : " ") + std::to_string(i);
-    for (float f : s->fvals) v += (v.empty() ? "" : " ") + formatFloat(f);
-    for (const auto& str : s->svals) v += (v.empty() ? "" : " ") + quoteString(str);
+    auto add = [&v](const std::string& item) {
+        if (!v.empty()) v += ' ';
+        v += item;
+    };
+    for (int i : s->ivals) add(std::to_string(i));
+    for (float f : s->fvals) add(formatFloat(f));
+    for (const auto& str : s->svals) add(quoteString(str));
     return v;
 }
 
@@ -101,8 +105,11 @@ std::string typeCode(const TypeSpec& t) {
                     : e.is_matrix() ? "m"
                     : e.is_string() ? "s"
                                     : "x";
-    if (t.is_array())
-        c += "[" + (t.is_unsized_array() ? std::string() : std::to_string(t.arraylength())) + "]";
+    if (t.is_array()) {
+        c += '[';
+        if (!t.is_unsized_array()) c += std::to_string(t.arraylength());
+        c += ']';
+    }
     return c;
 }
 
