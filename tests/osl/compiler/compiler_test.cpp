@@ -1,5 +1,7 @@
 // Compiles small shaders through OSLCompiler::compile_buffer and checks the OSO it writes and
 // the diagnostics it reports.
+#include "compiler_test_support.h"
+
 #include <OSL/oslcomp.h>
 
 #include <gtest/gtest.h>
@@ -9,15 +11,7 @@
 
 namespace {
 
-struct CapturingHandler : OSL::ErrorHandler {
-    std::vector<std::string> errors, warnings;
-    void operator()(int code, const std::string& msg) override {
-        if (code == EH_ERROR || code == EH_SEVERE)
-            errors.push_back(msg);
-        else if (code == EH_WARNING)
-            warnings.push_back(msg);
-    }
-};
+using CapturingHandler = compiler_test::CollectingHandler;
 
 struct Result {
     bool ok;

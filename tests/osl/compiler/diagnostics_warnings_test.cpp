@@ -1,6 +1,8 @@
 // The checks oslc makes beyond plain typing: printf-like format strings, names declared twice or
 // clashing with functions and shader globals, functions defined twice. Each message, its line,
 // its kind (error or warning), -Werror, `#pragma osl nowarn`, and shaders that must stay quiet.
+#include "compiler_test_support.h"
+
 #include <OSL/oslcomp.h>
 
 #include <gtest/gtest.h>
@@ -10,15 +12,7 @@
 
 namespace {
 
-struct CapturingHandler : OSL::ErrorHandler {
-    std::vector<std::string> errors, warnings;
-    void operator()(int code, const std::string& msg) override {
-        if (code == EH_ERROR || code == EH_SEVERE)
-            errors.push_back(msg);
-        else if (code == EH_WARNING)
-            warnings.push_back(msg);
-    }
-};
+using CapturingHandler = compiler_test::CollectingHandler;
 
 struct Result {
     bool ok = false;
