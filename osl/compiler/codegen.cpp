@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cmath>
 #include <filesystem>
+#include <functional>
 
 namespace OSL::pvt {
 
@@ -594,42 +595,66 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
         return;
     if (t.is_structure() && init->kind == NodeKind::InitList &&
         init->kids.size() <= s->fields.size()) {
-        // A struct default made of constants gives each field its own default.
-        bool allConst = true;
-        for (size_t i = 0; i < s->fields.size() && allConst; ++i) {
-            Symbol* f = s->fields[i];
-            if (i >= init->kids.size()) {
-                fillZero(f);
-                continue;
+        // A struct default made of constants (nested structs included) gives each field its
+        // own default.
+        std::function<bool(Symbol*, const Node*)> constFields = [&](Symbol* st, const Node* list) {
+            for (size_t i = 0; i < st->fields.size(); ++i) {
+                Symbol* f = st->fields[i];
+                if (i >= list->kids.size()) {
+                    for (auto* l : leaves)
+                        if (l == f || l->name.rfind(f->name + ".", 0) == 0) fillZero(l);
+                    continue;
+                }
+                const Node* k = list->kid(i);
+                if (f->type.is_closure() && k->kind == NodeKind::IntLit && k->intValue == 0)
+                    continue; // an empty closure: no value to write
+                if (f->type.is_structure() && k->kind == NodeKind::InitList &&
+                    k->kids.size() <= f->fields.size()) {
+                    if (!constFields(f, k)) return false;
+                    continue;
+                }
+                // Array fields are computed by code even from constants, as oslc does.
+                if (f->type.is_structure_based() || f->type.is_closure_based() ||
+                    f->type.is_array() || !constValue(k, f->type, f->ivals, f->fvals, f->svals))
+                    return false;
             }
-            const Node* k = init->kid(i);
-            if (f->type.is_closure() && k->kind == NodeKind::IntLit && k->intValue == 0)
-                continue; // an empty closure: no value to write
-            // Array fields are computed by code even from constants, as oslc does.
-            allConst = !f->type.is_structure_based() && !f->type.is_closure_based() &&
-                       !f->type.is_array() && constValue(k, f->type, f->ivals, f->fvals, f->svals);
-        }
+            return true;
+        };
+        const bool allConst = constFields(s, init);
         if (allConst) return;
+        for (auto* l : leaves) l->ivals.clear(), l->fvals.clear(), l->svals.clear();
         for (Symbol* f : s->fields) f->ivals.clear(), f->fvals.clear(), f->svals.clear();
-        bool plainFields = true;
-        for (Symbol* f : s->fields)
-            plainFields = plainFields && f->fields.empty() && !f->type.is_closure_based();
-        if (plainFields) {
+        // Pair each leaf field with its part of the list, through nested lists; a nested
+        // struct given by anything other than a list leaves the whole default to code.
+        std::vector<std::pair<Symbol*, const Node*>> parts;
+        std::function<bool(Symbol*, const Node*)> split = [&](Symbol* st, const Node* list) {
+            for (size_t i = 0; i < st->fields.size(); ++i) {
+                Symbol* f = st->fields[i];
+                const Node* k = i < list->kids.size() ? list->kid(i) : nullptr;
+                if (f->type.is_closure_based()) return false;
+                if (f->fields.empty()) {
+                    parts.emplace_back(f, k);
+                    continue;
+                }
+                if (!k || k->kind != NodeKind::InitList || k->kids.size() > f->fields.size())
+                    return false;
+                if (!split(f, k)) return false;
+            }
+            return true;
+        };
+        if (split(s, init)) {
             // Constant fields keep their defaults; each other field is computed by a code
             // section of its own and starts from whatever components are constant.
-            std::vector<Symbol*> computed;
-            for (size_t i = 0; i < s->fields.size(); ++i) {
-                Symbol* f = s->fields[i];
-                if (i >= init->kids.size()) {
+            std::vector<std::pair<Symbol*, const Node*>> computed;
+            for (auto& [f, k] : parts) {
+                if (!k) {
                     fillZero(f);
                     continue;
                 }
-                if (!f->type.is_array() &&
-                    constValue(init->kid(i), f->type, f->ivals, f->fvals, f->svals))
+                if (!f->type.is_array() && constValue(k, f->type, f->ivals, f->fvals, f->svals))
                     continue;
                 f->ivals.clear(), f->fvals.clear(), f->svals.clear();
                 fillZero(f);
-                const Node* k = init->kid(i);
                 bool components =
                     (k->kind == NodeKind::TypeCtor && !k->isCast) || k->kind == NodeKind::InitList;
                 if (f->type.is_triple() && components && k->kids.size() == 3) {
@@ -642,13 +667,12 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
                     }
                 }
                 f->initexpr = true;
-                computed.push_back(f);
+                computed.emplace_back(f, k);
             }
             m_curFile = p->file;
             m_curLine = p->line;
-            for (Symbol* f : computed) {
+            for (auto& [f, k] : computed) {
                 f->initBegin = nextOp();
-                const Node* k = init->kid(size_t(f->fieldIndex));
                 TypeSpec ft = f->type;
                 Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
                 if (!assignCompatible(ft, val->type)) {
@@ -661,6 +685,7 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
             }
             return;
         }
+        for (auto* l : leaves) l->ivals.clear(), l->fvals.clear(), l->svals.clear();
     }
     if (!t.is_structure_based() && !t.is_closure_based()) {
         std::vector<int> iv;

@@ -221,3 +221,47 @@ TEST(CodegenForms, DerivativeTakingOpsCarryArgderivs) {
 }
 
 } // namespace
+
+namespace {
+
+// The declaration line of `name` in the OSO, or "" when there is none.
+std::string symbolLine(const std::string& oso, const std::string& name) {
+    std::istringstream in(oso);
+    std::string line;
+    while (std::getline(in, line)) {
+        std::istringstream words(line);
+        std::string kind, type, sym;
+        words >> kind >> type >> sym;
+        if (type == "struct") words >> sym;
+        if ((kind == "param" || kind == "oparam") && sym == name) return line;
+    }
+    return "";
+}
+
+TEST(CodegenForms, NestedStructDefaultsKeepConstantLeavesAndComputeTheRest) {
+    const std::string oso = compileOso(R"(
+struct Inner { int i; float f; };
+struct Outer { Inner a; color c; int arr[2]; };
+shader t (Outer o = { { 3, 2.5 }, color(0.25, 0.5, 0.75), { 4, 5 } },
+          Outer w = { { 1 + 2, 2.5 }, color(u, 0.5, 0.75), { 4, 5 } },
+          output float out = 0) {
+    out = o.a.f + w.a.f;
+}
+)");
+    // Constant leaves of nested lists are defaults, with no code.
+    EXPECT_NE(symbolLine(oso, "o.a.i").find("\t3\t"), std::string::npos) << oso;
+    EXPECT_NE(symbolLine(oso, "o.a.f").find("\t2.5\t"), std::string::npos) << oso;
+    EXPECT_NE(symbolLine(oso, "o.c").find("\t0.25 0.5 0.75\t"), std::string::npos) << oso;
+    EXPECT_EQ(symbolLine(oso, "o.a.i").find("%initexpr"), std::string::npos);
+    EXPECT_TRUE(sectionOps(oso, "o.a.i").empty());
+    // An array leaf is computed by a section of its own, as is every non-constant leaf.
+    EXPECT_FALSE(sectionOps(oso, "o.arr").empty()) << oso;
+    EXPECT_FALSE(sectionOps(oso, "w.a.i").empty()) << oso;
+    EXPECT_FALSE(sectionOps(oso, "w.c").empty()) << oso;
+    EXPECT_TRUE(sectionOps(oso, "w.a.f").empty()) << oso;
+    EXPECT_NE(symbolLine(oso, "w.a.f").find("\t2.5\t"), std::string::npos) << oso;
+    // The computed colour starts from its constant components.
+    EXPECT_NE(symbolLine(oso, "w.c").find("\t0 0.5 0.75\t"), std::string::npos) << oso;
+}
+
+} // namespace
