@@ -181,7 +181,8 @@ derivativeNeeds(const ShaderGroup& group, const std::vector<std::vector<uint8_t>
 std::unique_ptr<Program> buildOnce(ShadingSystemImpl& sys, const ShaderGroup& group,
                                    std::string& error,
                                    const std::vector<std::vector<uint8_t>>& neverRun,
-                                   std::vector<std::vector<uint8_t>>& found) {
+                                   std::vector<std::vector<uint8_t>>& found,
+                                   std::vector<std::vector<uint8_t>>& needs) {
     auto prog = std::make_unique<Program>();
     prog->group = &group;
     prog->system = &sys;
@@ -203,7 +204,7 @@ std::unique_ptr<Program> buildOnce(ShadingSystemImpl& sys, const ShaderGroup& gr
     };
 
     // 1. Derivatives.
-    const std::vector<std::vector<uint8_t>> needs = derivativeNeeds(group, neverRun);
+    needs = derivativeNeeds(group, neverRun);
 
     // 2. Layout: globals, then constants, then one region per layer (reset when it runs).
     uint32_t cursor = 0;
@@ -524,15 +525,14 @@ std::unique_ptr<Program> buildOnce(ShadingSystemImpl& sys, const ShaderGroup& gr
 
 std::unique_ptr<Program> buildProgram(ShadingSystemImpl& sys, const ShaderGroup& group,
                                       std::string& error) {
-    std::vector<std::vector<uint8_t>> neverRun;
-    auto prog = buildOnce(sys, group, error, {}, neverRun);
+    std::vector<std::vector<uint8_t>> neverRun, needs;
+    auto prog = buildOnce(sys, group, error, {}, neverRun, needs);
     // Ops in a branch that fixed parameters rule out never run; when they were all that asked
     // for some derivatives, build again without them, so that the values computed are the ones
     // computed without derivatives (as the shader would give were the branch not there).
-    if (!prog || neverRun.empty() || derivativeNeeds(group, neverRun) == derivativeNeeds(group, {}))
-        return prog;
-    std::vector<std::vector<uint8_t>> again;
-    return buildOnce(sys, group, error, neverRun, again);
+    if (!prog || neverRun.empty() || derivativeNeeds(group, neverRun) == needs) return prog;
+    std::vector<std::vector<uint8_t>> again, againNeeds;
+    return buildOnce(sys, group, error, neverRun, again, againNeeds);
 }
 
 } // namespace OSL
