@@ -162,9 +162,8 @@ static std::string underscores(const std::string& name) {
 
 // Names are unique within a scope. The shader's parameters and the top level of its body share
 // the global scope with every function, as in oslc: there a name that is already a function is
-// an error, except for a parameter, which only gets a warning. (oslc's global scope also holds
-// the shader globals, so it rejects a parameter or top-level local named `v` or `P` too; we
-// accept those, which existing shaders rely on.)
+// an error, except for a parameter, which only gets a warning. The shader globals live there
+// too, so a parameter or top-level local named `v` or `P` is an error as well.
 void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
     Scope& scope = m_scopes.back();
     auto previousAt = [&](const std::string& file, int line) {
@@ -182,6 +181,10 @@ void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
         return;
     }
     if (int(m_scopes.size()) - 1 == m_shaderScopeDepth) {
+        if (isGlobalName(name)) {
+            error(at, clash);
+            return;
+        }
         auto fn = m_functions.find(name);
         if (fn != m_functions.end() && !fn->second.empty()) {
             const FunctionSymbol* last = fn->second.back().get();

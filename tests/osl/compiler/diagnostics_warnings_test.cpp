@@ -242,6 +242,23 @@ TEST(Redeclaration, ShaderLevelLocalNamedLikeAFunctionIsAnError) {
         << r->eh.errors[0];
 }
 
+// The shader globals share the shader's scope: a parameter or top-level local may not take one
+// of their names, but a function's locals and inner blocks may.
+TEST(Redeclaration, ShaderGlobalNamesAreTakenAtShaderLevel) {
+    auto param = compile("shader test (float v = 1, output float out = 0)\n{\n    out = v;\n}\n");
+    EXPECT_FALSE(param->ok);
+    ASSERT_EQ(param->eh.errors.size(), 1u) << all(param->eh.errors);
+    EXPECT_EQ(param->eh.errors[0], "test.osl:1: error: \"v\" already declared in this scope");
+    auto local = compile(shader("    point P = 0;\n    out = P[0];\n"));
+    EXPECT_FALSE(local->ok);
+    ASSERT_EQ(local->eh.errors.size(), 1u) << all(local->eh.errors);
+    EXPECT_EQ(local->eh.errors[0], "test.osl:3: error: \"P\" already declared in this scope");
+    auto inner =
+        compile("float f(float u) { float N = u; return N; }\n"
+                "shader test (output float out = 0)\n{\n    { float v = 2; out = f(v); }\n}\n");
+    EXPECT_TRUE(inner->ok) << all(inner->eh.errors);
+}
+
 // ---------------------------------------------------------------- functions defined twice
 
 TEST(Redefinition, SameSignatureTwiceWarnsWithEarlierPlaces) {

@@ -55,7 +55,7 @@ shader types(
     float wa[2] = {1, 2} [[ int worldunits = 1 ]],
     color c = color(0.1, 0.2, 0.3) [[ float min = 0, float max = 1 ]],
     point p = point(1, 2, 3),
-    vector v = vector(4, 5, 6),
+    vector vec = vector(4, 5, 6),
     normal nn = normal(0, 0, 1),
     color ca[] = {color(1, 0, 0), color(0, 1, 0)},
     matrix m = matrix(1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16),

@@ -230,7 +230,7 @@ std::vector<Case> NoiseCases(const std::string& name, const std::string& hlslExt
             std::string osl = oslCall;
             osl.replace(osl.find("ARGS"), 4, args);
             k.osl = d == 1 ? "float f = " + osl + "; r = color(f, 0, 0);"
-                           : "vector v = " + osl + "; r = color(v[0], v[1], v[2]);";
+                           : "vector res = " + osl + "; r = color(res[0], res[1], res[2]);";
             k.tolerance = tolerance;
             cases.push_back(k);
         }
