@@ -97,6 +97,15 @@ Symbol* CodeGen::newStructSymbol(const std::string& name, const TypeSpec& t, Sym
     return s;
 }
 
+Symbol* CodeGen::viewAs(Symbol* s, const TypeSpec& t) {
+    m_pool.push_back(std::make_unique<Symbol>(*s));
+    Symbol* v = m_pool.back().get();
+    v->type = t;
+    v->fields.clear();
+    v->aliasOf = s;
+    return v;
+}
+
 Symbol* CodeGen::temp(const TypeSpec& t) {
     Symbol* s = newStructSymbol("$tmp" + std::to_string(++m_tmpCount), t, SymTypeTemp);
     s->bornAt = nextOp();
@@ -246,6 +255,8 @@ int CodeGen::emit(const std::string& name, std::vector<Symbol*> args, std::strin
         if (!args.empty()) rw[0] = 'w';
     }
     op.rw = rw;
+    for (Symbol*& a : args)
+        while (a && a->aliasOf) a = a->aliasOf;
     op.args = std::move(args);
     op.file = m_curFile;
     op.line = m_curLine;
@@ -677,6 +688,11 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
             for (auto& [f, k] : computed) {
                 f->initBegin = nextOp();
                 TypeSpec ft = f->type;
+                if (ft.is_array() && k->kind == NodeKind::InitList) {
+                    initVariable(f, k, k, true); // element by element, or one constant
+                    f->initEnd = nextOp();
+                    continue;
+                }
                 Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
                 if (!assignCompatible(ft, val->type)) {
                     error(k, "Can't assign '" + val->type.string() + "' to '" + ft.string() + " " +
@@ -927,11 +943,14 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
             }
             for (size_t i = 0; i < init->kids.size(); ++i) {
                 const Node* k = init->kid(i);
-                Symbol* val = k->kind == NodeKind::InitList ? initList(k, elem) : expr(k, &elem);
                 LRef r;
                 r.sym = var;
                 r.index = constInt(int(i));
-                r.type = elem;
+                r.type = elem.is_structure_based()
+                             ? TypeSpec(elem.structspec()->name().c_str(), elem.structure())
+                             : elem;
+                if (structInto(k, r)) continue;
+                Symbol* val = k->kind == NodeKind::InitList ? initList(k, elem) : expr(k, &elem);
                 store(r, val, k);
             }
             return;
@@ -945,8 +964,16 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
             for (size_t i = 0; i < init->kids.size(); ++i) {
                 const Node* k = init->kid(i);
                 TypeSpec ft = spec->field(int(i)).type;
-                Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
                 Symbol* f = var->fields[i];
+                if (ft.is_array() && k->kind == NodeKind::InitList) {
+                    initVariable(f, k, k, isDecl); // an array field is filled in place
+                    continue;
+                }
+                LRef whole;
+                whole.sym = f;
+                whole.type = ft;
+                if (structInto(k, whole)) continue;
+                Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
                 if (!assignCompatible(ft, val->type) && !(ft.is_closure() && val->isConst())) {
                     error(k, "Can't assign '" + val->type.string() + "' to '" + ft.string() + " " +
                                  spec->name().string() + "." + spec->field(int(i)).name.string() +

@@ -62,6 +62,7 @@ private:
     Symbol* newSymbol(const std::string& name, const TypeSpec& t, SymType st);
     Symbol* newStructSymbol(const std::string& name, const TypeSpec& t, SymType st);
     Symbol* temp(const TypeSpec& t);
+    Symbol* viewAs(Symbol* s, const TypeSpec& t); // `s` seen as another triple type
     Symbol* constInt(int v);
     Symbol* constFloat(float v);
     Symbol* constString(const std::string& s);
@@ -111,6 +112,7 @@ private:
     Symbol* foldTriple(const TypeSpec& t, const std::vector<Symbol*>& args);
     Symbol* call(const Node* e, const TypeSpec* expected, Symbol* dest = nullptr);
     Symbol* structCtor(const Node* e, int structId, Symbol* dest = nullptr);
+    bool structInto(const Node* e, const LRef& dst);
     bool mentions(const Node* e, const Symbol* root);
     Symbol* initList(const Node* e, const TypeSpec& t);
     Symbol* indexRead(const Node* e);

@@ -14,6 +14,7 @@ const TypeSpec kFloat(TypeDesc::TypeFloat);
 const TypeSpec kString(TypeDesc::TypeString);
 
 const Symbol* rootOf(const Symbol* s) {
+    while (s && s->aliasOf) s = s->aliasOf;
     while (s && s->structParent) s = s->structParent;
     return s;
 }
@@ -481,6 +482,8 @@ Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected, Symbol* dest) {
         if (a->type.is_int() && !b->type.is_int()) a = convert(a, kFloat, e);
         if (b->type.is_int() && !a->type.is_int()) b = convert(b, kFloat, e);
     }
+    // A weighted closure names the closure first, whichever side of `*` it was written on.
+    if (rt.is_closure() && !a->type.is_closure()) std::swap(a, b);
     Symbol* r = temp(rt);
     emit(names.at(e->op), {r, a, b});
     return r;
@@ -575,7 +578,17 @@ Symbol* CodeGen::assign(const Node* e) {
             return v;
         }
         bool whole = !r.index && !r.comp && r.sym && !r.sym->isConst();
+        // A field of one element of a struct array is read into a temporary first, and the
+        // value is computed into that temporary, as oslc writes it.
+        Symbol* element = nullptr;
+        if (r.index && !r.comp && r.sym && r.sym->structParent &&
+            r.sym->structParent->type.is_array() && !r.type.is_array() &&
+            !r.type.is_structure_based() && !m_checkOnly) {
+            element = temp(r.type);
+            emit("aref", {element, r.sym, r.index});
+        }
         Symbol* v = whole ? exprInto(rhs, r.sym, &r.type) : expr(rhs, &r.type);
+        if (element && retarget(element, v)) v = element;
         m_curLine = e->line;
         const TypeSpec& t = r.type;
         std::string lhsName = e->kid(0)->kind == NodeKind::VarRef ? e->kid(0)->name : "";
@@ -738,6 +751,11 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
         }
         TypeSpec at = t;
         if (t.is_unsized_array()) at.make_array(int(std::max<size_t>(1, e->kids.size())));
+        if (Symbol* folded = constArray(e, at)) {
+            Symbol* r = temp(at);
+            emit("assign", {r, folded});
+            return r;
+        }
         Symbol* r = temp(at);
         for (size_t i = 0; i < e->kids.size(); ++i) {
             const Node* k = e->kid(i);
@@ -957,6 +975,45 @@ Symbol* CodeGen::structCtor(const Node* e, int structId, Symbol* dest) {
     return r;
 }
 
+// A struct written as an init list or by its constructor, stored field by field straight into
+// `dst` (a struct variable, field or array element), as oslc writes it. False, having emitted
+// nothing, when `e` is not such a value.
+bool CodeGen::structInto(const Node* e, const LRef& dst) {
+    if (!e || !dst.sym || dst.comp || m_checkOnly || !dst.type.is_structure()) return false;
+    int id = dst.type.structure();
+    if (e->kind == NodeKind::Call) {
+        auto st = m_structs.find(e->name);
+        if (st == m_structs.end() || st->second != id) return false;
+    } else if (e->kind != NodeKind::InitList) {
+        return false;
+    }
+    StructSpec* spec = dst.type.structspec();
+    if (int(e->kids.size()) > spec->numfields() ||
+        (e->kind == NodeKind::Call && int(e->kids.size()) != spec->numfields()) ||
+        dst.sym->fields.size() != size_t(spec->numfields()) || mentions(e, rootOf(dst.sym)))
+        return false;
+    m_curLine = e->line, m_curFile = e->file;
+    for (size_t i = 0; i < e->kids.size(); ++i) {
+        const Node* k = e->kid(i);
+        TypeSpec ft = spec->field(int(i)).type;
+        LRef f;
+        f.sym = dst.sym->fields[i];
+        f.index = dst.index;
+        f.type = ft.is_structure_based() && dst.index
+                     ? TypeSpec(ft.structspec()->name().c_str(), ft.structure())
+                     : ft;
+        if (structInto(k, f)) continue;
+        Symbol* v = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
+        if (!assignCompatible(ft, v->type) && !(ft.is_closure() && v->isConst())) {
+            error(k, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " +
+                         spec->name().string() + "." + spec->field(int(i)).name.string() + "'");
+            continue;
+        }
+        store(f, v, k, false);
+    }
+    return true;
+}
+
 bool CodeGen::canTarget(const Symbol* dest, const TypeSpec& t) const {
     if (dest && dest->type.is_structure() && t.is_structure() && equivalent(dest->type, t) &&
         dest->fields.size() == size_t(t.structspec()->numfields()))
@@ -984,6 +1041,12 @@ Symbol* CodeGen::exprInto(const Node* e, Symbol* dest, const TypeSpec* expected)
                                   ? dest
                                   : nullptr);
         return call(e, expected, dest);
+    }
+    if (e && dest && !m_checkOnly && dest->type.is_structure() && e->kind == NodeKind::InitList) {
+        LRef whole;
+        whole.sym = dest;
+        whole.type = dest->type;
+        if (structInto(e, whole)) return dest;
     }
     if (e && dest && !m_checkOnly && dest->type.is_structure() && e->kind == NodeKind::Binary &&
         e->op != "&&" && e->op != "||") {
@@ -1017,9 +1080,29 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
     std::vector<Symbol*> args;
     std::vector<LRef> refs;
     std::vector<TypeSpec> types;
+    // Casting one triple to another changes no bits: the function gets the value itself, and
+    // the cast's type chooses the overload (ops that treat points, vectors and normals
+    // differently say so in their names).
     for (const auto& k : e->kids) {
         const Node* a = k.get();
         LRef r;
+        if (a->kind == NodeKind::TypeCtor && a->isCast && a->kids.size() == 1 && !m_checkOnly) {
+            TypeSpec t = resolveType(a->typeName, a);
+            if (t.is_triple()) {
+                Symbol* v = expr(a->kid(0));
+                if (v->type.is_triple() && !v->type.is_array()) {
+                    args.push_back(v);
+                    refs.push_back(r);
+                    types.push_back(t);
+                    continue;
+                }
+                m_curLine = a->line;
+                args.push_back(v->type == t ? v : convert(v, t, a));
+                refs.push_back(r);
+                types.push_back(args.back()->type);
+                continue;
+            }
+        }
         if (a->kind == NodeKind::VarRef || a->kind == NodeKind::Index ||
             a->kind == NodeKind::Field) {
             r = lvalue(a, false);
@@ -1226,8 +1309,11 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
         const auto& p = fn->params[i];
         Symbol* a = args[i];
         if (p.output) {
+            const TypeSpec& at = refs[i].valid() ? refs[i].sym->type : a->type;
+            bool sameArray = p.type.is_unsized_array() && at.is_array() &&
+                             equivalent(at.elementtype(), p.type.elementtype());
             if (refs[i].valid() && !refs[i].index && !refs[i].comp &&
-                equivalent(refs[i].sym->type, p.type)) {
+                (equivalent(at, p.type) || sameArray)) {
                 a = refs[i].sym;
             } else if (refs[i].valid() && a->symtype == SymTypeTemp &&
                        equivalent(a->type, p.type)) {
@@ -1244,6 +1330,9 @@ Symbol* CodeGen::inlineCall(FunctionSymbol* fn, const Node* e, std::vector<Symbo
         } else if (!(a->type == p.type) && !(p.type.is_unsized_array() && a->type.is_array()) &&
                    !(equivalent(a->type, p.type) && !a->type.is_structure_based())) {
             a = convert(a, p.type, e);
+        } else if (!p.output && a->type.is_triple() && !a->type.is_array() && p.type.is_triple() &&
+                   !(a->type == p.type)) {
+            a = viewAs(a, p.type);
         }
         m_scopes.back().vars[p.name] = a;
     }

@@ -30,6 +30,9 @@ struct Symbol {
     int bornAt = -1;             // for temporaries: the op count when created
     Symbol* renamedTo = nullptr; // a temporary whose op now writes this variable instead
     bool unsizedParam = false;   // a `T name[]` parameter: sized by its default, written as T[]
+    // A function parameter bound to an argument of another triple type: the function body sees
+    // the parameter's type, the ops use the argument itself. Never written to the OSO.
+    Symbol* aliasOf = nullptr;
 
     bool isConst() const { return symtype == SymTypeConst; }
     void markRead(int op) {

@@ -264,4 +264,85 @@ shader t (Outer o = { { 3, 2.5 }, color(0.25, 0.5, 0.75), { 4, 5 } },
     EXPECT_NE(symbolLine(oso, "w.c").find("\t0 0.5 0.75\t"), std::string::npos) << oso;
 }
 
+TEST(CodegenForms, ConstantArrayLeafOfAStructDefaultIsOneConstant) {
+    const std::string oso = compileOso(R"(
+struct S { float f; int arr[3]; };
+shader t (S s = { 1, { 4, 5, 6 } }, S w = { 2, { 7, int(u), 9 } }, output float out = 0) {
+    out = s.f + w.f;
+}
+)");
+    EXPECT_EQ(sectionOps(oso, "s.arr"), (Ops{"assign s.arr $const"}));
+    // An element computed by code: every element is stored straight into the field.
+    EXPECT_EQ(sectionOps(oso, "w.arr"),
+              (Ops{"aassign w.arr $const $const", "assign $tmp u", "aassign w.arr $const $tmp",
+                   "aassign w.arr $const $const"}));
+}
+
+TEST(CodegenForms, FieldOfAStructArrayElementIsReadBeforeItIsWritten) {
+    const char* decl = "struct ray { point pos; float w; };\n";
+    EXPECT_EQ(
+        mainOps(std::string(decl) + "shader t (int i = 1, output float o = 0)"
+                                    " { ray r[2]; r[i].w = u * 2; r[0].pos = point(1, 2, 3);"
+                                    " o = r[1].w; }"),
+        (Ops{"aref $tmp r.w i", "mul $tmp u $const", "aassign r.w i $tmp", "aref $tmp r.pos $const",
+             "aassign r.pos $const $const", "aref o r.w $const", "end"}));
+    // A plain array element, or an array field of a plain struct, is stored directly.
+    EXPECT_EQ(mainOps("struct S { int a[2]; };\n"
+                      "shader t (int i = 1, output float o = 0) { S s; float f[2]; f[i] = u;"
+                      " s.a[i] = 3; o = f[1] + s.a[0]; }"),
+              (Ops{"aassign f i u", "aassign s.a i $const", "aref $tmp f $const",
+                   "aref $tmp s.a $const", "assign $tmp $tmp", "add o $tmp $tmp", "end"}));
+}
+
+TEST(CodegenForms, StructValuesAreStoredFieldByFieldIntoTheirPlace) {
+    const char* decls = "struct C4 { color rgb; float a; };\n"
+                        "struct Nest { C4 c; float k; };\n";
+    // Into array elements: each field goes straight into its element.
+    EXPECT_EQ(mainOps(std::string(decls) +
+                      "shader t (output float o = 0) { C4 arr[2] = { C4(color(1, 2, 3), u),"
+                      " { 0.5, 2 } }; o = arr[1].a; }"),
+              (Ops{"aassign arr.rgb $const $const", "aassign arr.a $const u", "assign $tmp $const",
+                   "aassign arr.rgb $const $tmp", "aassign arr.a $const $const",
+                   "aref o arr.a $const", "end"}));
+    // Into a nested struct field: the innermost ops write the fields themselves.
+    EXPECT_EQ(
+        mainOps(std::string(decls) +
+                "shader t (output float o = 0) { Nest n = { { {u, 2, 3}, v }, 1 }; o = n.c.a; }"),
+        (Ops{"color n.c.rgb u $const $const", "assign n.c.a v", "assign n.k $const",
+             "assign o n.c.a", "end"}));
+    // A struct returned as an init list lands in the caller's variable.
+    EXPECT_EQ(mainOps(std::string(decls) +
+                      "C4 make() { return { {1, 2, 3}, 4 }; }\n"
+                      "shader t (output float o = 0) { C4 c = make(); o = c.a; }"),
+              (Ops{"functioncall $const", "assign c.rgb $const", "assign c.a $const",
+                   "assign o c.a", "end"}));
+}
+
+TEST(CodegenForms, TripleCastsAndOtherTriplesPassStraightIntoFunctions) {
+    // The cast picks the vector overload; the point itself is passed, and the op named by the
+    // overload treats it as a vector.
+    const char* fn = "vector twice(vector d) { return transform(\"world\", d) * 2; }\n";
+    Ops ops = mainOps(std::string(fn) + "shader t (output vector o = 0) { o = twice(P); }");
+    ASSERT_GE(ops.size(), 3u);
+    EXPECT_EQ(ops[2], "transformv $tmp $const $const P") << ops[2];
+    EXPECT_EQ(mainOps("shader t (output vector o = 0) { o = transform(\"world\", (vector) P); }"),
+              (Ops{"functioncall $const", "transformv o $const $const P", "end"}));
+    EXPECT_EQ(mainOps("shader t (output normal o = 0) { o = transform(\"world\", (normal) P); }"),
+              (Ops{"functioncall $const", "transformn o $const $const P", "end"}));
+}
+
+TEST(CodegenForms, WeightedClosureNamesTheClosureFirst) {
+    EXPECT_EQ(mainOps("shader t (output closure color c = 0) { c = u * emission(); }"),
+              (Ops{"closure $tmp $const", "mul c $tmp u", "end"}));
+    EXPECT_EQ(mainOps("shader t (output closure color c = 0) { c = emission() * color(1, 0, 0); }"),
+              (Ops{"closure $tmp $const", "mul c $tmp $const", "end"}));
+}
+
+TEST(CodegenForms, ConstantArrayInitListArgumentIsOneConstant) {
+    Ops ops = mainOps("float first(float a[]) { return a[0]; }\n"
+                      "shader t (output float o = 0) { o = first({1.0, 2.0, 3.0}); }");
+    ASSERT_FALSE(ops.empty());
+    EXPECT_EQ(ops[0], "assign $tmp $const");
+}
+
 } // namespace
