@@ -571,6 +571,9 @@ void CodeGen::shaderParam(const Node* p, ShaderUnit&) {
         // The default's length sizes the array inside the shader; the OSO still says T[].
         t.make_array(int(init->kids.size()));
     }
+    // The OSO has no form for an array of structs as a parameter.
+    if (t.is_structure_based() && t.is_array() && init && init->kind == NodeKind::InitList)
+        error(p, "array of struct are not allowed as parameters");
     Symbol* s = newStructSymbol(p->name, t, st);
     s->unsizedParam = unsized;
     for (const auto& m : p->metadata) s->metaHints.push_back(metaHint(m.get()));
@@ -1018,10 +1021,15 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
     assignInto(var, val, at);
 }
 
+// Structs and arrays have no truth value (closures do: whether they are empty).
+void CodeGen::conditionCheck(const TypeSpec& t, const Node* at, const std::string& as) {
+    if (t.is_structure_based() && !t.is_array()) error(at, "Cannot use a struct " + as);
+    if (t.is_array()) error(at, "Cannot use an array " + as);
+}
+
 void CodeGen::ifStatement(const Node* s) {
     Symbol* cond = expr(s->kid(0));
-    if (cond->type.is_structure_based() || cond->type.is_array())
-        error(s, "Cannot use a " + cond->type.string() + " as a condition");
+    conditionCheck(cond->type, s, "as an 'if' condition");
     m_curLine = s->line;
     m_curFile = s->file;
     if (!cond->type.is_int()) {
@@ -1050,8 +1058,9 @@ void CodeGen::loop(const Node* s) {
         cond = expr(c);
         m_curLine = s->line;
         m_curFile = s->file;
-        if (cond->type.is_structure_based() || cond->type.is_closure_based())
-            error(s, "Cannot use a " + cond->type.string() + " as a condition");
+        if (cond->type.is_closure_based())
+            error(s, std::string("Cannot use a closure as an '") + opname + "' condition");
+        conditionCheck(cond->type, s, std::string("as an '") + opname + "' condition");
         Symbol* t = temp(TypeSpec(TypeDesc::TypeInt));
         emit("neq", {t, cond, constInt(0)});
         cond = t;

@@ -280,7 +280,7 @@ CodeGen::LRef CodeGen::lvalue(const Node* e, bool forWrite) {
     }
     // Any other expression: an r-value held in a temporary.
     Symbol* v = expr(e);
-    if (forWrite) error(e, "Cannot assign to an expression that is not a variable");
+    if (forWrite) error(e, "Can't assign via = to something that isn't an lvalue");
     r.sym = v;
     r.type = v->type;
     return r;
@@ -644,6 +644,8 @@ Symbol* CodeGen::assign(const Node* e) {
 Symbol* CodeGen::ternary(const Node* e, Symbol* dest) {
     Symbol* c = expr(e->kid(0));
     m_curLine = e->line;
+    if (c->type.is_closure_based()) error(e, "Cannot use a closure as a condition");
+    conditionCheck(c->type, e, "as a condition");
     if (!c->type.is_int()) {
         Symbol* t = temp(kInt);
         emit("neq", {t, c, constInt(0)});
@@ -693,6 +695,16 @@ Symbol* CodeGen::typeCtor(const Node* e) {
     const bool steer = e->isCast && e->kids.size() == 1;
     for (const auto& k : e->kids) args.push_back(expr(k.get(), steer ? &t : nullptr));
     m_curLine = e->line;
+    if (steer) {
+        // A cast goes where an assignment could, and also from float to int and between
+        // triples.
+        const TypeSpec& from = args[0]->type;
+        if (!from.is_unknown() && !assignable(t, from) && !(t.is_int() && from.is_float()) &&
+            !(t.is_triple() && from.is_triple())) {
+            error(e, "Cannot cast '" + from.string() + "' to '" + t.string() + "'");
+            return temp(t);
+        }
+    }
     if (t.is_closure_based() || t.is_structure_based() || t.is_void()) {
         error(e, "Cannot construct a " + t.string());
         return temp(t);

@@ -388,4 +388,40 @@ TEST(ErrorWording, OperatorsIndicesAndDeclarations) {
     EXPECT_TRUE(two->ok) << all(two->eh.errors);
 }
 
+TEST(ErrorWording, ConditionsCastsAndAssignments) {
+    auto cond = compile("struct S { float a; };\n"
+                        "shader test (output float out = 0)\n{\n    S s;\n    float arr[2];\n"
+                        "    closure color cc = 0;\n"
+                        "    if (s) out = 1;\n    if (arr) out = 1;\n    if (cc) out = 1;\n"
+                        "    while (arr) out = 2;\n    for (; s; ) out = 2;\n"
+                        "    do { out = 1; } while (cc);\n    out = cc ? 1 : 2;\n}\n");
+    ASSERT_EQ(cond->eh.errors.size(), 6u) << all(cond->eh.errors);
+    EXPECT_EQ(cond->eh.errors[0], "test.osl:7: error: Cannot use a struct as an 'if' condition");
+    EXPECT_EQ(cond->eh.errors[1], "test.osl:8: error: Cannot use an array as an 'if' condition");
+    // A closure may be tested by `if` (is it empty?), but not by a loop or `?:`.
+    EXPECT_EQ(cond->eh.errors[2],
+              "test.osl:10: error: Cannot use an array as an 'while' condition");
+    EXPECT_EQ(cond->eh.errors[3], "test.osl:11: error: Cannot use a struct as an 'for' condition");
+    EXPECT_EQ(cond->eh.errors[4],
+              "test.osl:12: error: Cannot use a closure as an 'dowhile' condition");
+    EXPECT_EQ(cond->eh.errors[5], "test.osl:13: error: Cannot use a closure as a condition");
+
+    auto cast = compile(shader("    color c = (color) name;\n    float f = (float) P;\n"
+                               "    int i = (int) 1.5;\n    vector d = (vector) P;\n"));
+    ASSERT_EQ(cast->eh.errors.size(), 2u) << all(cast->eh.errors);
+    EXPECT_EQ(cast->eh.errors[0], "test.osl:3: error: Cannot cast 'string' to 'color'");
+    EXPECT_EQ(cast->eh.errors[1], "test.osl:4: error: Cannot cast 'point' to 'float'");
+
+    auto lv = compile(shader("    (out + 1) = 2;\n"));
+    ASSERT_EQ(lv->eh.errors.size(), 1u) << all(lv->eh.errors);
+    EXPECT_EQ(lv->eh.errors[0],
+              "test.osl:3: error: Can't assign via = to something that isn't an lvalue");
+
+    auto sa =
+        compile("struct R { string f; };\n"
+                "shader test (R files[2] = { {\"a\"}, {\"b\"} }, output float out = 0)\n{\n}\n");
+    ASSERT_EQ(sa->eh.errors.size(), 1u) << all(sa->eh.errors);
+    EXPECT_EQ(sa->eh.errors[0], "test.osl:2: error: array of struct are not allowed as parameters");
+}
+
 } // namespace
