@@ -110,6 +110,7 @@ private:
     Symbol* assign(const Node* e);
     Symbol* ternary(const Node* e, Symbol* dest = nullptr);
     Symbol* typeCtor(const Node* e);
+    Symbol* construct(const Node* e, const TypeSpec& t, std::vector<Symbol*> args);
     Symbol* foldTriple(const TypeSpec& t, const std::vector<Symbol*>& args);
     Symbol* call(const Node* e, const TypeSpec* expected, Symbol* dest = nullptr);
     Symbol* structCtor(const Node* e, int structId, Symbol* dest = nullptr);

@@ -694,6 +694,12 @@ Symbol* CodeGen::typeCtor(const Node* e) {
     // colour noise, not the float one converted.
     const bool steer = e->isCast && e->kids.size() == 1;
     for (const auto& k : e->kids) args.push_back(expr(k.get(), steer ? &t : nullptr));
+    return construct(e, t, args);
+}
+
+// The value of constructor or cast `e` to type `t` from its evaluated arguments.
+Symbol* CodeGen::construct(const Node* e, const TypeSpec& t, std::vector<Symbol*> args) {
+    const bool steer = e->isCast && args.size() == 1;
     m_curLine = e->line;
     if (steer) {
         // A cast goes where an assignment could, and also from float to int and between
@@ -1101,15 +1107,14 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
         if (a->kind == NodeKind::TypeCtor && a->isCast && a->kids.size() == 1 && !m_checkOnly) {
             TypeSpec t = resolveType(a->typeName, a);
             if (t.is_triple()) {
-                Symbol* v = expr(a->kid(0));
+                Symbol* v = expr(a->kid(0), &t); // the cast steers an overloaded call
                 if (v->type.is_triple() && !v->type.is_array()) {
                     args.push_back(v);
                     refs.push_back(r);
                     types.push_back(t);
                     continue;
                 }
-                m_curLine = a->line;
-                args.push_back(v->type == t ? v : convert(v, t, a));
+                args.push_back(construct(a, t, {v}));
                 refs.push_back(r);
                 types.push_back(args.back()->type);
                 continue;

@@ -331,6 +331,15 @@ TEST(CodegenForms, TripleCastsAndOtherTriplesPassStraightIntoFunctions) {
               (Ops{"functioncall $const", "transformn o $const $const P", "end"}));
 }
 
+TEST(CodegenForms, CastArgumentStillSteersTheOverloadItWraps) {
+    // The colour noise, not the float one widened.
+    Ops ops = mainOps("float first(color c) { return c[0]; }\n"
+                      "shader t (output float o = 0) { o = first((color) noise(P)); }");
+    ASSERT_GE(ops.size(), 2u);
+    EXPECT_EQ(ops[0], "noise $tmp P");
+    EXPECT_EQ(ops[1], "functioncall $const");
+}
+
 TEST(CodegenForms, WeightedClosureNamesTheClosureFirst) {
     EXPECT_EQ(mainOps("shader t (output closure color c = 0) { c = u * emission(); }"),
               (Ops{"closure $tmp $const", "mul c $tmp u", "end"}));
