@@ -1,6 +1,8 @@
 // The standard library functions written in OSL (stdosl.h): a call is inlined after a
 // `functioncall` op and built from ops every runtime provides, the ops oslc's library produces;
 // the functions the runtime provides natively stay single ops.
+#include "compiler_test_support.h"
+
 #include <OSL/oslcomp.h>
 
 #include <gtest/gtest.h>
@@ -10,13 +12,6 @@
 #include <vector>
 
 namespace {
-
-struct Errors : OSL::ErrorHandler {
-    std::vector<std::string> errors;
-    void operator()(int code, const std::string& msg) override {
-        if (code == EH_ERROR || code == EH_SEVERE) errors.push_back(msg);
-    }
-};
 
 struct Op {
     std::string name;
@@ -57,8 +52,8 @@ struct Compiled {
     bool ok = false;
     std::string oso;
     std::vector<Op> ops;
-    Errors eh;
-    std::string firstError() const { return eh.errors.empty() ? "" : eh.errors[0]; }
+    compiler_test::CollectingHandler eh;
+    std::string firstError() const { return eh.firstError(); }
 };
 
 std::unique_ptr<Compiled> compile(const std::string& body, const std::string& params = "",

@@ -1,6 +1,8 @@
 // The shipped struct headers (color2.h, color4.h, vector2.h, vector4.h, matrix33.h): their
 // operator overloads and math functions compile into calls of the right overloads, and misuse
 // is reported.
+#include "compiler_test_support.h"
+
 #include <OSL/oslcomp.h>
 
 #include <gtest/gtest.h>
@@ -10,18 +12,11 @@
 
 namespace {
 
-struct Errors : OSL::ErrorHandler {
-    std::vector<std::string> errors;
-    void operator()(int code, const std::string& msg) override {
-        if (code == EH_ERROR || code == EH_SEVERE) errors.push_back(msg);
-    }
-};
-
 struct Compiled {
     bool ok = false;
     std::string oso;
-    Errors eh;
-    std::string firstError() const { return eh.errors.empty() ? "" : eh.errors[0]; }
+    compiler_test::CollectingHandler eh;
+    std::string firstError() const { return eh.firstError(); }
 };
 
 std::unique_ptr<Compiled> compile(const std::string& header, const std::string& body) {
