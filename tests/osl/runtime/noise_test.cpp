@@ -7,7 +7,6 @@
 
 #include <OSL/oslexec.h>
 
-#include <OpenImageIO/imageio.h>
 
 #include <gtest/gtest.h>
 
@@ -22,24 +21,7 @@ namespace {
 
 using D2 = Dual2<float>;
 
-// A reference image of the conformance corpus, as floats.
-struct RefImage {
-    int width = 0, height = 0, channels = 0;
-    std::vector<float> pixels;
-
-    explicit RefImage(const std::string& caseAndFile) {
-        const std::string path =
-            std::string(TESSEL_SHARED_DIR) + "/osl-conformance/testsuite/" + caseAndFile;
-        auto in = OIIO::ImageInput::open(path);
-        if (!in) return;
-        const OIIO::ImageSpec& spec = in->spec();
-        width = spec.width, height = spec.height, channels = spec.nchannels;
-        pixels.resize(size_t(width) * height * channels);
-        if (!in->read_image(0, 0, 0, channels, OIIO::TypeDesc::FLOAT, pixels.data())) width = 0;
-    }
-    bool ok() const { return width > 0; }
-    float at(int x, int y, int c) const { return pixels[(size_t(y) * width + x) * channels + c]; }
-};
+using RefImage = CorpusImage;
 
 // The shading language's mod: the result takes the sign of the divisor.
 float oslMod(float a, float b) {

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <OSL/oslexec.h>
+#include <OpenImageIO/imageio.h>
 
 #include <gtest/gtest.h>
 
@@ -246,5 +247,25 @@ code ___main___
 	add		Ci $tmp1 $tmp2 	%argrw{"wrr"}
 	end
 )";
+
+// A reference image of the conformance corpus ("CASE/ref/FILE"), as floats; not ok() when it
+// cannot be read.
+struct CorpusImage {
+    int width = 0, height = 0, channels = 0;
+    std::vector<float> pixels;
+
+    explicit CorpusImage(const std::string& caseAndFile) {
+        const std::string path =
+            std::string(TESSEL_SHARED_DIR) + "/osl-conformance/testsuite/" + caseAndFile;
+        auto in = OIIO::ImageInput::open(path);
+        if (!in) return;
+        const OIIO::ImageSpec& spec = in->spec();
+        width = spec.width, height = spec.height, channels = spec.nchannels;
+        pixels.resize(size_t(width) * size_t(height) * size_t(channels));
+        if (!in->read_image(0, 0, 0, channels, OIIO::TypeDesc::FLOAT, pixels.data())) width = 0;
+    }
+    bool ok() const { return width > 0; }
+    float at(int x, int y, int c) const { return pixels[(size_t(y) * width + x) * channels + c]; }
+};
 
 } // namespace runtime_test
