@@ -393,10 +393,14 @@ bool opTakesDerivs(const ShaderMaster& m, const MasterOp& op, int arg) {
     if (arg == 1 && (name == "Dx" || name == "Dy" || name == "Dz" || name == "filterwidth" ||
                      name == "area" || name == "calculatenormal"))
         return true;
-    // Texture filtering reads the footprint of its coordinates.
-    if ((name == "texture" && (arg == 2 || arg == 3)) || (name == "texture3d" && arg == 2) ||
-        (name == "environment" && arg == 2))
-        return true;
+    // Texture filtering reads the footprint of its coordinates, unless the call gives that
+    // footprint itself (explicit derivatives follow the coordinates, before any options).
+    const auto footprintFromCoords = [&](int nextArg) {
+        const MasterSymbol* next = opArgSymbol(m, op, nextArg);
+        return !next || next->type.is_string();
+    };
+    if (name == "texture" && (arg == 2 || arg == 3)) return footprintFromCoords(4);
+    if ((name == "texture3d" || name == "environment") && arg == 2) return footprintFromCoords(3);
     return noisePositionTakesDerivs(m, op, arg);
 }
 

@@ -1,6 +1,7 @@
 // Texture lookups from shaders: values, alpha, channels, wrap modes, missing files and their
 // messages, derivatives, environment maps and gettextureinfo (UDIM sets included), against
 // small images written for the test.
+#include "../../../osl/runtime/program.h"
 #include "runtime_test_support.h"
 
 #include <OSL/oslexec.h>
@@ -341,6 +342,54 @@ TEST_F(TextureTest, DerivativesFollowTheCoordinates) {
     EXPECT_NEAR(dx.z, 0.0f, 1e-4f) << "blue is constant";
     // Wider explicit derivatives blur more but keep the value of a linear ramp.
     EXPECT_NEAR(color(*g, "e").x, 0.5f, 0.02f);
+}
+
+// Without derivative hints in the OSO, coordinates keep derivatives for the filter's footprint
+// only when the call does not give the footprint itself.
+TEST_F(TextureTest, CoordinatesCarryDerivativesOnlyWhenTheyGiveTheFootprint) {
+    const char* oso = R"(OpenShadingLanguage 1.00
+# Compiled by hand
+shader footprint
+param	string	filename	""
+oparam	color	a	0 0 0
+oparam	color	b	0 0 0
+oparam	color	c	0 0 0
+global	float	u
+global	float	v
+local	float	s1
+local	float	t1
+local	float	s2
+local	float	t2
+local	float	s3
+local	float	t3
+const	float	$two	2
+const	float	$zero	0
+const	string	$blur	"blur"
+code ___main___
+	mul		s1 u $two
+	mul		t1 v $two
+	mul		s2 u $two
+	mul		t2 v $two
+	mul		s3 u $two
+	mul		t3 v $two
+	texture		a filename s1 t1
+	texture		b filename s2 t2 $zero $zero $zero $zero
+	texture		c filename s3 t3 $blur $zero
+	end
+)";
+    ASSERT_TRUE(ss.LoadMemoryCompiledShader("footprint", oso)) << handler.errors;
+    ShaderGroupRef g = group("footprint", {{"filename", rampFile}});
+    run(*g);
+    for (const char* name : {"s1", "t1", "s3", "t3"}) {
+        const ShaderSymbol* sym = ss.find_symbol(*g, ustring(name));
+        ASSERT_NE(sym, nullptr) << name;
+        EXPECT_TRUE(sym->derivs) << name;
+    }
+    for (const char* name : {"s2", "t2"}) {
+        const ShaderSymbol* sym = ss.find_symbol(*g, ustring(name));
+        ASSERT_NE(sym, nullptr) << name;
+        EXPECT_FALSE(sym->derivs) << name << " has explicit derivatives";
+    }
 }
 
 TEST_F(TextureTest, UnknownOptionIsReportedAndTheLookupStillRuns) {
