@@ -330,6 +330,12 @@ void CodeGen::declareFunction(const Node* n) {
         fn->params.push_back(fp);
     }
     if (fn->file != "stdosl.h" && n->name.rfind("___", 0) == 0) error(n, underscores(n->name));
+    if (isGlobalName(n->name)) {
+        std::string msg(1, '"');
+        msg += n->name;
+        msg += "\" already declared in this scope as a " + global(n->name)->type.string();
+        error(n, msg);
+    }
     if (n->body && fn->file != "stdosl.h") warnIfRedefined(*fn, n);
     m_functions[n->name].push_back(std::move(fn));
 }

@@ -257,6 +257,10 @@ TEST(Redeclaration, ShaderGlobalNamesAreTakenAtShaderLevel) {
         compile("float f(float u) { float N = u; return N; }\n"
                 "shader test (output float out = 0)\n{\n    { float v = 2; out = f(v); }\n}\n");
     EXPECT_TRUE(inner->ok) << all(inner->eh.errors);
+    auto fn = compile("float P(float x) { return x; }\nshader test ()\n{\n}\n");
+    ASSERT_EQ(fn->eh.errors.size(), 1u) << all(fn->eh.errors);
+    EXPECT_EQ(fn->eh.errors[0],
+              "test.osl:1: error: \"P\" already declared in this scope as a point");
 }
 
 // ---------------------------------------------------------------- functions defined twice
