@@ -7,7 +7,6 @@
 
 #include <OSL/oslexec.h>
 
-
 #include <gtest/gtest.h>
 
 #include <cmath>
