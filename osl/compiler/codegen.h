@@ -115,6 +115,7 @@ private:
     Symbol* call(const Node* e, const TypeSpec* expected, Symbol* dest = nullptr);
     Symbol* structCtor(const Node* e, int structId, Symbol* dest = nullptr);
     bool structInto(const Node* e, const LRef& dst);
+    void storeFields(const Node* e, const LRef& dst);
     bool mentions(const Node* e, const Symbol* root);
     Symbol* initList(const Node* e, const TypeSpec& t);
     Symbol* indexRead(const Node* e);

@@ -185,27 +185,10 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
                 error(at, "Too many initializers for struct '" + spec->name().string() + "'");
                 return;
             }
-            for (size_t i = 0; i < init->kids.size(); ++i) {
-                const Node* k = init->kid(i);
-                TypeSpec ft = spec->field(int(i)).type;
-                Symbol* f = var->fields[i];
-                if (ft.is_array() && k->kind == NodeKind::InitList) {
-                    initVariable(f, k, k, isDecl); // an array field is filled in place
-                    continue;
-                }
-                LRef whole;
-                whole.sym = f;
-                whole.type = ft;
-                if (structInto(k, whole)) continue;
-                Symbol* val = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
-                if (!assignCompatible(ft, val->type) && !(ft.is_closure() && val->isConst())) {
-                    error(k, "Can't assign '" + val->type.string() + "' to '" + ft.string() + " " +
-                                 spec->name().string() + "." + spec->field(int(i)).name.string() +
-                                 "'");
-                    continue;
-                }
-                assignInto(f, val, k);
-            }
+            LRef whole;
+            whole.sym = var;
+            whole.type = t;
+            storeFields(init, whole);
             return;
         }
         Symbol* val = initList(init, t);

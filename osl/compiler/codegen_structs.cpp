@@ -36,19 +36,11 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
             error(e, "Too many initializers for struct '" + spec->name().string() + "'");
             return temp(t);
         }
-        Symbol* r = temp(t);
-        for (size_t i = 0; i < e->kids.size(); ++i) {
-            const Node* k = e->kid(i);
-            TypeSpec ft = spec->field(int(i)).type;
-            Symbol* v = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
-            if (!assignCompatible(ft, v->type)) {
-                error(k, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " +
-                             spec->name().string() + "." + spec->field(int(i)).name.string() + "'");
-                continue;
-            }
-            assignInto(r->fields[i], v, k);
-        }
-        return r;
+        LRef r;
+        r.sym = temp(t);
+        r.type = t;
+        storeFields(e, r);
+        return r.sym;
     }
     if (t.is_triple() || t.is_matrix()) {
         // `{a, b, c}` for a triple reads as its constructor.
@@ -76,8 +68,7 @@ Symbol* CodeGen::initList(const Node* e, const TypeSpec& t) {
     return temp(t);
 }
 
-// ---------------------------------------------------------------- calls
-
+// Whether `e` reads any part of the variable `root` (a struct read while it is rebuilt).
 bool CodeGen::mentions(const Node* e, const Symbol* root) {
     if (!e) return false;
     if (e->kind == NodeKind::VarRef) {
@@ -101,18 +92,11 @@ Symbol* CodeGen::structCtor(const Node* e, int structId, Symbol* dest) {
     }
     if (int(e->kids.size()) > spec->numfields())
         error(e, "Too many initializers for struct '" + e->name + "'");
-    Symbol* r = dest ? dest : temp(t);
-    for (size_t i = 0; i < e->kids.size() && int(i) < spec->numfields(); ++i) {
-        TypeSpec ft = spec->field(int(i)).type;
-        Symbol* v = expr(e->kid(i), &ft);
-        if (!assignCompatible(ft, v->type)) {
-            error(e, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " + e->name +
-                         "." + spec->field(int(i)).name.string() + "'");
-            continue;
-        }
-        assignInto(r->fields[i], v, e);
-    }
-    return r;
+    LRef r;
+    r.sym = dest ? dest : temp(t);
+    r.type = t;
+    storeFields(e, r);
+    return r.sym;
 }
 
 // A struct written as an init list or by its constructor, stored field by field straight into
@@ -133,7 +117,17 @@ bool CodeGen::structInto(const Node* e, const LRef& dst) {
         dst.sym->fields.size() != size_t(spec->numfields()) || mentions(e, rootOf(dst.sym)))
         return false;
     m_curLine = e->line, m_curFile = e->file;
-    for (size_t i = 0; i < e->kids.size(); ++i) {
+    storeFields(e, dst);
+    return true;
+}
+
+// Stores the items of `e` (an init list, or a constructor's arguments) into the fields of the
+// struct `dst` (a variable, field or array element) one by one. A nested struct value, and an
+// array list into a field that is not an element's, are written straight into their field.
+void CodeGen::storeFields(const Node* e, const LRef& dst) {
+    StructSpec* spec = dst.type.structspec();
+    const bool list = e->kind == NodeKind::InitList;
+    for (size_t i = 0; i < e->kids.size() && int(i) < spec->numfields(); ++i) {
         const Node* k = e->kid(i);
         TypeSpec ft = spec->field(int(i)).type;
         LRef f;
@@ -142,16 +136,21 @@ bool CodeGen::structInto(const Node* e, const LRef& dst) {
         f.type = ft.is_structure_based() && dst.index
                      ? TypeSpec(ft.structspec()->name().c_str(), ft.structure())
                      : ft;
+        if (ft.is_array() && !dst.index && k->kind == NodeKind::InitList) {
+            initVariable(f.sym, k, k, true);
+            continue;
+        }
         if (structInto(k, f)) continue;
         Symbol* v = k->kind == NodeKind::InitList ? initList(k, ft) : expr(k, &ft);
-        if (!assignCompatible(ft, v->type) && !(ft.is_closure() && v->isConst())) {
-            error(k, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " +
-                         spec->name().string() + "." + spec->field(int(i)).name.string() + "'");
+        // A list may give a closure field the constant 0; a constructor's argument may not.
+        if (!assignCompatible(ft, v->type) && !(list && ft.is_closure() && v->isConst())) {
+            error(list ? k : e, "Can't assign '" + v->type.string() + "' to '" + ft.string() + " " +
+                                    spec->name().string() + "." +
+                                    spec->field(int(i)).name.string() + "'");
             continue;
         }
         store(f, v, k, false);
     }
-    return true;
 }
 
 bool CodeGen::canTarget(const Symbol* dest, const TypeSpec& t) const {
