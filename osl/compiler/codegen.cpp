@@ -170,6 +170,15 @@ static std::string underscores(const std::string& name) {
     return msg;
 }
 
+// `"name" already declared in this scope`, built piecewise: GCC 12 falsely reports an
+// overlapping copy for "\"" + name.
+static std::string alreadyDeclared(const std::string& name) {
+    std::string msg(1, '"');
+    msg += name;
+    msg += "\" already declared in this scope";
+    return msg;
+}
+
 // Names are unique within a scope. The shader's parameters and the top level of its body share
 // the global scope with every function, as in oslc: there a name that is already a function is
 // an error, except for a parameter, which only gets a warning. The shader globals live there
@@ -180,10 +189,7 @@ void CodeGen::declare(const std::string& name, Symbol* s, const Node* at) {
         return "\n\t\tprevious declaration was at " +
                std::filesystem::path(file).filename().string() + ":" + std::to_string(line);
     };
-    // Built piecewise: GCC 12 falsely reports an overlapping copy for "\"" + name.
-    std::string clash(1, '"');
-    clash += name;
-    clash += "\" already declared in this scope";
+    const std::string clash = alreadyDeclared(name);
     if (name.rfind("___", 0) == 0) error(at, underscores(name));
     if (scope.vars.count(name)) {
         const Node* prior = scope.declaredAt[name];
@@ -270,10 +276,7 @@ int CodeGen::emit(const std::string& name, std::vector<Symbol*> args, std::strin
 void CodeGen::declareStruct(const Node* n) {
     bool taken = m_structs.count(n->name) != 0;
     if (taken || isGlobalName(n->name) || m_functions.count(n->name)) {
-        std::string msg(1, '"');
-        msg += n->name;
-        msg += "\" already declared in this scope";
-        error(n, msg);
+        error(n, alreadyDeclared(n->name));
         if (taken) return;
     }
     auto* spec = new StructSpec(ustring(n->name), 0);
@@ -331,12 +334,9 @@ void CodeGen::declareFunction(const Node* n) {
         fn->params.push_back(fp);
     }
     if (fn->file != "stdosl.h" && n->name.rfind("___", 0) == 0) error(n, underscores(n->name));
-    if (isGlobalName(n->name)) {
-        std::string msg(1, '"');
-        msg += n->name;
-        msg += "\" already declared in this scope as a " + global(n->name)->type.string();
-        error(n, msg);
-    }
+    if (isGlobalName(n->name))
+        error(n,
+              alreadyDeclared(n->name) + " as a " + TypeSpec(shaderGlobals().at(n->name)).string());
     if (n->body && fn->file != "stdosl.h") warnIfRedefined(*fn, n);
     m_functions[n->name].push_back(std::move(fn));
 }
