@@ -134,8 +134,6 @@ FunctionSymbol* CodeGen::resolveOverload(const std::string& name,
     return ties[0];
 }
 
-// Whether `e` reads any part of the variable `root` (a struct read while it is rebuilt).
-
 Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
     auto st = m_structs.find(e->name);
     if (st != m_structs.end()) return structCtor(e, st->second);
@@ -155,15 +153,10 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
             TypeSpec t = resolveType(a->typeName, a);
             if (t.is_triple()) {
                 Symbol* v = expr(a->kid(0), &t); // the cast steers an overloaded call
-                if (v->type.is_triple() && !v->type.is_array()) {
-                    args.push_back(v);
-                    refs.push_back(r);
-                    types.push_back(t);
-                    continue;
-                }
-                args.push_back(construct(a, t, {v}));
+                const bool same = v->type.is_triple() && !v->type.is_array();
+                args.push_back(same ? v : construct(a, t, {v}));
                 refs.push_back(r);
-                types.push_back(args.back()->type);
+                types.push_back(t);
                 continue;
             }
         }
@@ -217,9 +210,9 @@ Symbol* CodeGen::call(const Node* e, const TypeSpec* expected, Symbol* dest) {
     bool formatChecked = fn->builtin && isFormatFunction(fn->name) && fn->file == "stdosl.h" &&
                          checkFormatCall(fn, e, types);
     if (fn->builtin) return builtinCall(fn, e, args, refs, expected, formatChecked);
-    if (dest &&
-        (!canTarget(dest, fn->ret) || std::find(args.begin(), args.end(), dest) != args.end()))
-        dest = nullptr;
+    // The result goes straight into `dest` unless an argument reads it, or an output argument
+    // is one of its components (stored back after the call).
+    if (dest && !canTarget(dest, fn->ret)) dest = nullptr;
     for (const LRef& r : refs)
         if (dest && r.sym == dest) dest = nullptr;
     for (Symbol* a : args)

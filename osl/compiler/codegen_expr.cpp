@@ -363,6 +363,15 @@ void CodeGen::store(const LRef& r, Symbol* value, const Node* at, bool checkWrit
     emit("aassign", {r.sym, r.index, elem});
 }
 
+// The op of a binary operator (also of the operator in a compound assignment).
+static const std::string& binaryOpName(const std::string& op) {
+    static const std::map<std::string, std::string> names = {
+        {"+", "add"},   {"-", "sub"}, {"*", "mul"},  {"/", "div"}, {"%", "mod"}, {"==", "eq"},
+        {"!=", "neq"},  {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
+        {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
+    return names.at(op);
+}
+
 static TypeSpec arithmeticResult(const std::string& op, const TypeSpec& a, const TypeSpec& b,
                                  bool& ok) {
     ok = true;
@@ -427,24 +436,18 @@ Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected, Symbol* dest) {
     Symbol* b = operand(e->kid(1));
     m_curLine = e->line;
     m_curFile = e->file;
-    static const std::map<std::string, std::string> overloadNames = {
-        {"+", "add"},   {"-", "sub"}, {"*", "mul"},  {"/", "div"}, {"%", "mod"}, {"==", "eq"},
-        {"!=", "ne"},   {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
-        {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
     // A user-defined operator wins over the built-in meaning.
     if (dest && (rootOf(a) == rootOf(dest) || rootOf(b) == rootOf(dest))) dest = nullptr;
-    if (Symbol* r = operatorCall("__operator__" + overloadNames.at(e->op) + "__", {a, b}, e, dest))
-        return r;
+    // The operator functions spell inequality "ne", the op "neq".
+    const std::string opname = binaryOpName(e->op);
+    const std::string overload = "__operator__" + (e->op == "!=" ? "ne" : opname) + "__";
+    if (Symbol* r = operatorCall(overload, {a, b}, e, dest)) return r;
     bool ok = true;
     TypeSpec rt = arithmeticResult(e->op, a->type, b->type, ok);
     if (!ok) {
         error(e, "Not allowed: '" + a->type.string() + " " + e->op + " " + b->type.string() + "'");
         return temp(rt);
     }
-    static const std::map<std::string, std::string> names = {
-        {"+", "add"},   {"-", "sub"}, {"*", "mul"},  {"/", "div"}, {"%", "mod"}, {"==", "eq"},
-        {"!=", "neq"},  {"<", "lt"},  {">", "gt"},   {"<=", "le"}, {">=", "ge"}, {"&", "bitand"},
-        {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
     // Integers meet floats as floats in arithmetic; a comparison takes both as they are.
     const bool compare = e->op == "==" || e->op == "!=" || e->op == "<" || e->op == ">" ||
                          e->op == "<=" || e->op == ">=";
@@ -460,7 +463,7 @@ Symbol* CodeGen::binary(const Node* e, const TypeSpec* expected, Symbol* dest) {
     // A weighted closure names the closure first, whichever side of `*` it was written on.
     if (rt.is_closure() && !a->type.is_closure()) std::swap(a, b);
     Symbol* r = temp(rt);
-    emit(names.at(e->op), {r, a, b});
+    emit(opname, {r, a, b});
     return r;
 }
 
@@ -599,9 +602,6 @@ Symbol* CodeGen::assign(const Node* e) {
         error(e, "Not allowed: '" + cur->type.string() + " " + op + " " + v->type.string() + "'");
         return cur;
     }
-    static const std::map<std::string, std::string> names = {
-        {"+", "add"},    {"-", "sub"},   {"*", "mul"}, {"/", "div"},  {"%", "mod"},
-        {"&", "bitand"}, {"|", "bitor"}, {"^", "xor"}, {"<<", "shl"}, {">>", "shr"}};
     if (v->type.is_int() && !cur->type.is_int()) v = convert(v, kFloat, e);
     bool direct = !r.index && !r.comp && equivalent(rt, cur->type);
     Symbol* dst = direct ? r.sym : temp(rt);
@@ -611,7 +611,7 @@ Symbol* CodeGen::assign(const Node* e) {
     while (root && root->structParent) root = root->structParent;
     if (root && root->symtype == SymTypeGlobal && m_nonWritableGlobals.count(root->name))
         warning(e, "cannot write to non-output parameter \"" + root->name + "\"");
-    emit(names.at(op), {dst, cur, v});
+    emit(binaryOpName(op), {dst, cur, v});
     if (!direct) store(r, dst, e);
     return dst;
 }
