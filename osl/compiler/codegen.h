@@ -62,7 +62,7 @@ private:
     Symbol* newSymbol(const std::string& name, const TypeSpec& t, SymType st);
     Symbol* newStructSymbol(const std::string& name, const TypeSpec& t, SymType st);
     Symbol* temp(const TypeSpec& t);
-    void conditionCheck(const TypeSpec& t, const Node* at, const std::string& as);
+    void conditionCheck(const TypeSpec& t, const Node* at, const std::string& as, bool closureOk);
     Symbol* viewAs(Symbol* s, const TypeSpec& t); // `s` seen as another triple type
     Symbol* constInt(int v);
     Symbol* constFloat(float v);

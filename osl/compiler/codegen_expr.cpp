@@ -619,8 +619,7 @@ Symbol* CodeGen::assign(const Node* e) {
 Symbol* CodeGen::ternary(const Node* e, Symbol* dest) {
     Symbol* c = expr(e->kid(0));
     m_curLine = e->line;
-    if (c->type.is_closure_based()) error(e, "Cannot use a closure as a condition");
-    conditionCheck(c->type, e, "as a condition");
+    conditionCheck(c->type, e, "as a condition", false);
     if (!c->type.is_int()) {
         Symbol* t = temp(kInt);
         emit("neq", {t, c, constInt(0)});

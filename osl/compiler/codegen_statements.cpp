@@ -225,15 +225,18 @@ void CodeGen::initVariable(Symbol* var, const Node* init, const Node* at, bool i
     assignInto(var, val, at);
 }
 
-// Structs and arrays have no truth value (closures do: whether they are empty).
-void CodeGen::conditionCheck(const TypeSpec& t, const Node* at, const std::string& as) {
+// Structs and arrays have no truth value; closures have one (whether they are empty) for `if`
+// only. `as` ends the message: "as an 'if' condition", "as a condition".
+void CodeGen::conditionCheck(const TypeSpec& t, const Node* at, const std::string& as,
+                             bool closureOk) {
+    if (t.is_closure_based() && !closureOk) error(at, "Cannot use a closure " + as);
     if (t.is_structure_based() && !t.is_array()) error(at, "Cannot use a struct " + as);
     if (t.is_array()) error(at, "Cannot use an array " + as);
 }
 
 void CodeGen::ifStatement(const Node* s) {
     Symbol* cond = expr(s->kid(0));
-    conditionCheck(cond->type, s, "as an 'if' condition");
+    conditionCheck(cond->type, s, "as an 'if' condition", true);
     m_curLine = s->line;
     m_curFile = s->file;
     if (!cond->type.is_int()) {
@@ -262,9 +265,7 @@ void CodeGen::loop(const Node* s) {
         cond = expr(c);
         m_curLine = s->line;
         m_curFile = s->file;
-        if (cond->type.is_closure_based())
-            error(s, std::string("Cannot use a closure as an '") + opname + "' condition");
-        conditionCheck(cond->type, s, std::string("as an '") + opname + "' condition");
+        conditionCheck(cond->type, s, std::string("as an '") + opname + "' condition", false);
         Symbol* t = temp(TypeSpec(TypeDesc::TypeInt));
         emit("neq", {t, cond, constInt(0)});
         cond = t;
